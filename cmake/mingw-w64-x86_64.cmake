@@ -1,0 +1,18 @@
+# Cross-compiles for 64-bit Windows with Debian's MinGW-w64 (posix threads).
+set(CMAKE_SYSTEM_NAME Windows)
+set(CMAKE_SYSTEM_PROCESSOR x86_64)
+
+set(OSTRAND_MINGW_PREFIX x86_64-w64-mingw32)
+set(CMAKE_C_COMPILER ${OSTRAND_MINGW_PREFIX}-gcc-posix)
+set(CMAKE_CXX_COMPILER ${OSTRAND_MINGW_PREFIX}-g++-posix)
+set(CMAKE_RC_COMPILER ${OSTRAND_MINGW_PREFIX}-windres)
+
+set(CMAKE_FIND_ROOT_PATH /usr/${OSTRAND_MINGW_PREFIX})
+set(CMAKE_FIND_ROOT_PATH_MODE_PROGRAM NEVER)
+set(CMAKE_FIND_ROOT_PATH_MODE_LIBRARY ONLY)
+set(CMAKE_FIND_ROOT_PATH_MODE_INCLUDE ONLY)
+# Packages may also come from install trees outside the sysroot (CMAKE_PREFIX_PATH).
+set(CMAKE_FIND_ROOT_PATH_MODE_PACKAGE BOTH)
+
+# Test executables run under Wine.
+set(CMAKE_CROSSCOMPILING_EMULATOR /usr/lib/wine/wine64)

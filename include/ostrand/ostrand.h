@@ -1,0 +1,9 @@
+// Everything the library exports.
+#pragma once
+
+#include <ostrand/platform.h>
+#include <ostrand/version.h>
+
+#include <ostrand/text/ustring.h>
+
+#include <ostrand/errors/Exception.h>

@@ -1,0 +1,19 @@
+// Identifiers of the library's own resources (shared by the resource script and the sources).
+#pragma once
+
+#define IDS_SOURCE_WIN32 101
+#define IDS_SOURCE_RECEIVER 102
+#define IDS_SOURCE_XML 103
+#define IDS_SOURCE_MATRIX 104
+#define IDS_SUCCESS 105
+#define IDS_BUTTON_OK 106
+#define IDS_BUTTON_CANCEL 107
+#define IDS_BUTTON_ABORT 108
+#define IDS_BUTTON_RETRY 109
+#define IDS_BUTTON_IGNORE 110
+#define IDS_BUTTON_YES 111
+#define IDS_BUTTON_NO 112
+#define IDS_MATRIX_INVALID_DIMENSION 113
+#define IDS_MATRIX_INCOMPATIBLE_DIMENSION 114
+#define IDS_MATRIX_INVALID_INDEX 115
+#define IDS_MATRIX_DIVISION_BY_ZERO 116
