@@ -7,3 +7,5 @@
 #include <ostrand/text/ustring.h>
 
 #include <ostrand/errors/Exception.h>
+
+#include <ostrand/system/Object.h>
