@@ -9,3 +9,4 @@
 #include <ostrand/errors/Exception.h>
 
 #include <ostrand/system/Object.h>
+#include <ostrand/system/File.h>
