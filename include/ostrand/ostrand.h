@@ -10,3 +10,4 @@
 
 #include <ostrand/system/Object.h>
 #include <ostrand/system/File.h>
+#include <ostrand/system/CommPort.h>
