@@ -11,3 +11,6 @@
 #include <ostrand/system/Object.h>
 #include <ostrand/system/File.h>
 #include <ostrand/system/CommPort.h>
+#include <ostrand/system/Thread.h>
+#include <ostrand/system/APC.h>
+#include <ostrand/system/Misc.h>
