@@ -14,3 +14,6 @@
 #include <ostrand/system/Thread.h>
 #include <ostrand/system/APC.h>
 #include <ostrand/system/Misc.h>
+
+#include <ostrand/logging/LogFile.h>
+#include <ostrand/logging/LogFileServer.h>
