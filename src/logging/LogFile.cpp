@@ -22,17 +22,32 @@ const size_t kWriteChunk = 256 * 1024;
 
 const char kHexDigits[] = "0123456789ABCDEF";
 
-// What isgraph gives in the default locale: 0x21..0x7E are shown as themselves, everything else as ".".
-struct PrintableTable
+// Per byte value: its hex cell "XX " followed by one more space, and its printable character (what
+// isgraph gives in the default locale: 0x21..0x7E as themselves, everything else as "."). A cell is
+// stored with one spare space so that it can be copied as one word; the spare lands where the next
+// cell or the spaces after the hex column go.
+template <class Ch> struct DumpTables
 {
-    char c[256];
-    PrintableTable()
+    Ch cell[256][4];
+    Ch printable[256];
+    DumpTables()
     {
         for (int i = 0; i < 256; ++i)
-            c[i] = (i >= 0x21 && i <= 0x7E) ? static_cast<char>(i) : '.';
+        {
+            cell[i][0] = Ch(kHexDigits[i >> 4]);
+            cell[i][1] = Ch(kHexDigits[i & 15]);
+            cell[i][2] = Ch(' ');
+            cell[i][3] = Ch(' ');
+            printable[i] = (i >= 0x21 && i <= 0x7E) ? Ch(i) : Ch('.');
+        }
     }
 };
-const PrintableTable kPrintable;
+
+template <class Ch> const DumpTables<Ch>& Tables()
+{
+    static const DumpTables<Ch> tables;
+    return tables;
+}
 
 size_t DumpSize(size_t size, size_t perLine)
 {
@@ -44,22 +59,17 @@ size_t DumpSize(size_t size, size_t perLine)
 // One routine serves the wide text of Bin2Text and the UTF-8 bytes that the worker writes.
 template <class Ch> void WriteDump(const unsigned char* data, size_t size, size_t perLine, Ch* out)
 {
+    const DumpTables<Ch>& t = Tables<Ch>();
     while (size > 0)
     {
         const size_t n = size < perLine ? size : perLine;
         *out++ = Ch(' ');
-        for (size_t i = 0; i < n; ++i)
-        {
-            const unsigned b = data[i];
-            out[0] = Ch(kHexDigits[b >> 4]);
-            out[1] = Ch(kHexDigits[b & 15]);
-            out[2] = Ch(' ');
-            out += 3;
-        }
+        for (size_t i = 0; i < n; ++i, out += 3)
+            std::memcpy(out, t.cell[data[i]], sizeof(t.cell[0]));
         for (size_t i = 3 * n; i < 3 * perLine + 4; ++i)
             *out++ = Ch(' ');
         for (size_t i = 0; i < n; ++i)
-            out[i] = Ch(static_cast<unsigned char>(kPrintable.c[data[i]]));
+            out[i] = t.printable[data[i]];
         out += n;
         out[0] = Ch('\r');
         out[1] = Ch('\n');
