@@ -23,7 +23,7 @@ escapes \\r \\n \\t \\xHH \\\\):
     close                  send what is still queued, then close the line (the master)
     hold                   stay silent until told to stop
 
-Status lines go to the status file (and stdout): "READY <port> <slave>" once the link exists, then
+Status lines go to the status file (to stdout without --dir): "READY <port> <slave>" once the link exists, then
 "DONE ok" or "DONE fail: <reason>" at the end. The peer stops when the stop file appears, on SIGTERM or
 SIGINT, when stdin is a pipe that reaches its end (--stdin-stop), or when --timeout expires, whichever
 comes first; "close" ends it too. A failed command (an expect that timed out) is reported at the end,
@@ -115,10 +115,11 @@ class Peer:
     # Status
 
     def say(self, line):
-        print(line, flush=True)
         if self.status:
             self.status.write(line + "\n")
             self.status.flush()
+        else:
+            print(line, flush=True)
 
     # The line
 
