@@ -10,6 +10,7 @@
 
 #include <ostrand/system/Object.h>
 #include <ostrand/system/File.h>
+#include <ostrand/system/Socket.h>
 #include <ostrand/system/CommPort.h>
 #include <ostrand/system/Thread.h>
 #include <ostrand/system/APC.h>

@@ -3,6 +3,7 @@
 #include <climits>
 #include <cstdio>
 #include <cstdlib>
+#include <cwchar>
 #include <cwctype>
 #include <stdexcept>
 #include <wchar.h>
@@ -101,13 +102,41 @@ ustring& ustring::operator+=(wchar_t c)
     return *this;
 }
 
-ustring operator+(const ustring& a, const ustring& b)
+namespace
+{
+ustring Concatenate(const wchar_t* a, size_t na, const wchar_t* b, size_t nb)
 {
     ustring r;
-    r.reserve(a.size() + b.size());
-    r.append(a);
-    r.append(b);
+    r.reserve(na + nb);
+    r.append(a, na);
+    r.append(b, nb);
     return r;
+}
+} // namespace
+
+ustring operator+(const ustring& a, const ustring& b)
+{
+    return Concatenate(a.data(), a.size(), b.data(), b.size());
+}
+
+ustring operator+(const ustring& a, const wchar_t* b)
+{
+    return Concatenate(a.data(), a.size(), b, std::wcslen(b));
+}
+
+ustring operator+(const wchar_t* a, const ustring& b)
+{
+    return Concatenate(a, std::wcslen(a), b.data(), b.size());
+}
+
+ustring operator+(const ustring& a, wchar_t b)
+{
+    return Concatenate(a.data(), a.size(), &b, 1);
+}
+
+ustring operator+(wchar_t a, const ustring& b)
+{
+    return Concatenate(&a, 1, b.data(), b.size());
 }
 
 // Code-page conversion ---------------------------------------------------------------------------------

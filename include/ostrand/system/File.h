@@ -19,6 +19,8 @@
 #include <ostrand/system/Object.h>
 #include <ostrand/text/ustring.h>
 
+#include <shlobj.h> // the CSIDL_ folder values of the special-folder functions
+
 namespace ostrand
 {
 

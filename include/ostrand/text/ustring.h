@@ -163,7 +163,12 @@ public:
     static bool String2GUID(const wchar_t* text, GUID& guid);    // what CLSIDFromString accepts
 };
 
+// Concatenation. The mixed forms make `u + L"text"` and `L"text" + u` unambiguous ustrings.
 OSTRAND_API ustring operator+(const ustring& a, const ustring& b);
+OSTRAND_API ustring operator+(const ustring& a, const wchar_t* b);
+OSTRAND_API ustring operator+(const wchar_t* a, const ustring& b);
+OSTRAND_API ustring operator+(const ustring& a, wchar_t b);
+OSTRAND_API ustring operator+(wchar_t a, const ustring& b);
 
 // Comparison operators: compare(other, npos) against 0. A null pointer compares as the empty string.
 OSTRAND_API bool operator==(const ustring& a, const ustring& b);
