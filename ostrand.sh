@@ -1,6 +1,7 @@
 #!/bin/sh
 # The two commands of the project, for a fresh Debian 12 machine (run as root):
-#   ./ostrand.sh demo    builds the library and runs the demo program under Wine
+#   ./ostrand.sh demo    builds the library and runs the demo against a simulated instrument
+#                        (add --tcp to talk to it over a loopback socket instead of COM5)
 #   ./ostrand.sh test    builds everything and runs the whole test suite under Wine
 #   ./ostrand.sh bench   builds and runs the benchmarks under Wine
 # Each installs the Debian packages it needs, configures and builds in ./build.
@@ -33,12 +34,13 @@ configure_and_build() {
 
 case "${1:-}" in
 demo)
+    # ./ostrand.sh demo [--tcp]: the simulated instrument answers on COM5 of the Wine prefix (a
+    # pseudo-terminal), or with --tcp on a loopback port.
     install_packages
     configure_and_build
-    shift
     "$build/wine-env.sh" setup
     status=0
-    "$build/wine-env.sh" run "$build/bin/ostrand-demo.exe" "$@" || status=$?
+    "$top/examples/run-demo.sh" "$build" "${2:-}" || status=$?
     "$build/wine-env.sh" shutdown
     exit $status
     ;;
