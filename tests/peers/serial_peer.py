@@ -275,7 +275,7 @@ class Peer:
 def main():
     parser = argparse.ArgumentParser(description="Serial peer on a pseudo-terminal for the Wine tests.")
     parser.add_argument("--port", required=True, help="port name, e.g. com5")
-    parser.add_argument("--prefix", default=os.environ.get("WINEPREFIX"), help="Wine prefix")
+    parser.add_argument("--prefix", help="Wine prefix (default $WINEPREFIX, else Wine's own ~/.wine)")
     parser.add_argument("--dir", help="work folder: status and stop files, default record file")
     parser.add_argument("--script", help="script file ('-' for stdin)")
     parser.add_argument("-e", dest="commands", action="append", default=[], help="script command(s)")
@@ -284,7 +284,9 @@ def main():
     parser.add_argument("--stdin-stop", action="store_true", help="stop when stdin reaches its end")
     args = parser.parse_args()
     if not args.prefix:
-        parser.error("no Wine prefix: pass --prefix or set WINEPREFIX")
+        args.prefix = os.environ.get("WINEPREFIX") or os.path.expanduser("~/.wine")
+    if not os.path.isdir(os.path.join(args.prefix, "dosdevices")):
+        parser.error("%s is not a Wine prefix (it has no dosdevices folder)" % args.prefix)
     if args.record is None and args.dir:
         args.record = os.path.join(args.dir, "received")
 
