@@ -59,7 +59,8 @@ void CStdException::CExInfo::Clear()
 
 // CWinException ----------------------------------------------------------------------------------------
 
-CWinException::CWinException(unsigned int line, const wchar_t* fileName, const wchar_t* function, DWORD errorCode)
+CWinException::CWinException(unsigned int line, const wchar_t* fileName, const wchar_t* function,
+                             DWORD errorCode)
     : CStdException(line, fileName, function), m_dwErrorCode(errorCode)
 {
 }
@@ -92,10 +93,9 @@ bool CWinException::GetSource(ustring& source) const
 bool CWinException::GetErrorMessage(ustring& message) const
 {
     wchar_t* text = NULL;
-    const DWORD n = ::FormatMessageW(FORMAT_MESSAGE_ALLOCATE_BUFFER | FORMAT_MESSAGE_IGNORE_INSERTS |
-                                         FORMAT_MESSAGE_FROM_SYSTEM,
-                                     NULL, m_dwErrorCode, MAKELANGID(LANG_NEUTRAL, SUBLANG_DEFAULT),
-                                     reinterpret_cast<wchar_t*>(&text), 0, NULL);
+    const DWORD n = ::FormatMessageW(
+        FORMAT_MESSAGE_ALLOCATE_BUFFER | FORMAT_MESSAGE_IGNORE_INSERTS | FORMAT_MESSAGE_FROM_SYSTEM, NULL,
+        m_dwErrorCode, MAKELANGID(LANG_NEUTRAL, SUBLANG_DEFAULT), reinterpret_cast<wchar_t*>(&text), 0, NULL);
     if (n != 0 && text != NULL)
     {
         message.assign(text, n);
@@ -104,6 +104,8 @@ bool CWinException::GetErrorMessage(ustring& message) const
     }
     if (text != NULL)
         ::LocalFree(text);
+    if (FindSupplementaryMessage(m_dwErrorCode, message))
+        return true;
     message.sprintf(L"Unknown error: %d (0x%X).", m_dwErrorCode, m_dwErrorCode);
     return false;
 }

@@ -100,10 +100,15 @@ public:
     void Throw() const override;
     // "Win32", translated.
     bool GetSource(ustring& source) const override;
-    // The system's message text; otherwise "Unknown error: <decimal> (0x<hex>)." and false.
+    // The system's message text, else the entry of DATA\Win32Errors.txt beside the library; otherwise
+    // "Unknown error: <decimal> (0x<hex>)." and false.
     bool GetErrorMessage(ustring& message) const override;
 
 private:
+    // Looks `code` up in the supplementary message file, read afresh on every call. False when the
+    // file is missing, unreadable, not UTF-16 with a byte-order mark or has no entry for the code.
+    static bool FindSupplementaryMessage(DWORD code, ustring& message);
+
     DWORD m_dwErrorCode;
 };
 
