@@ -32,13 +32,14 @@ ustring SupplementaryFilePath()
     return path;
 }
 
-// As the runtime reads numbers: the leading digits of the base, no range error. A key that is no
-// number reads as 0.
-DWORD ReadKey(const ustring& key)
+// The number of a key as the runtime reads it: the leading digits of the base, no range error; a key
+// that is no number reads as 0. `key` is trimmed of spaces and points into the text, where spaces and
+// the comma follow it: they end the digits just as the end of a copy of the key would.
+DWORD ReadKey(const wchar_t* key, size_t length)
 {
-    if (key.size() >= 2 && key[0] == L'0' && (key[1] == L'x' || key[1] == L'X'))
-        return std::wcstoul(key.c_str() + 2, NULL, 16);
-    return std::wcstoul(key.c_str(), NULL, 10);
+    if (length >= 2 && key[0] == L'0' && (key[1] == L'x' || key[1] == L'X'))
+        return std::wcstoul(key + 2, NULL, 16);
+    return std::wcstoul(key, NULL, 10);
 }
 
 ustring EntryText(ustring text)
@@ -51,23 +52,28 @@ ustring EntryText(ustring text)
     return text;
 }
 
-// Splits the file's text into entries as the pieces arrive. The buffer holds what is not consumed yet
-// and never starts with a line feed. A line without a comma stays in the buffer and becomes the front
-// of the next entry's key. The scan positions remember how far the comma and the line feed after it
-// have been searched for, so a line of megabytes is scanned once and not again for every piece.
+// Splits the file's text into entries as the pieces arrive. The unconsumed text starts at m_nStart
+// and never with a line feed; consumed text is dropped when the next piece arrives. A line without a
+// comma stays and becomes the front of the next entry's key. The scan positions remember how far the
+// comma and the line feed after it have been searched for, so a line of megabytes is scanned once
+// rather than once for every piece.
 class CEntryScanner
 {
 public:
-    explicit CEntryScanner(DWORD code) : m_dwCode(code), m_nCommaFrom(0), m_nLineFeedFrom(0) {}
+    explicit CEntryScanner(DWORD code) : m_dwCode(code), m_nStart(0), m_nCommaFrom(0), m_nLineFeedFrom(0) {}
 
     // Appends `count` units and parses the entries complete so far; true when one is for the code.
     bool Append(const wchar_t* units, size_t count, ustring& message)
     {
+        m_strBuffer.erase(0, m_nStart);
+        m_nCommaFrom -= m_nStart;
+        m_nLineFeedFrom -= m_nStart;
+        m_nStart = 0;
         const size_t old = m_strBuffer.size();
         m_strBuffer.append(units, count);
         m_strBuffer.erase(std::remove(m_strBuffer.begin() + old, m_strBuffer.end(), L'\r'),
                           m_strBuffer.end());
-        DropLeadingLineFeeds();
+        SkipLineFeeds();
         return Parse(message);
     }
 
@@ -89,32 +95,33 @@ private:
                 m_nLineFeedFrom = m_strBuffer.size();
                 return false;
             }
-            ustring key(m_strBuffer.substr(0, comma));
-            if (ReadKey(key.trim(L' ')) == m_dwCode)
+            size_t keyBegin = m_nStart, keyEnd = comma;
+            while (keyBegin < keyEnd && m_strBuffer[keyBegin] == L' ')
+                ++keyBegin;
+            while (keyEnd > keyBegin && m_strBuffer[keyEnd - 1] == L' ')
+                --keyEnd;
+            if (ReadKey(m_strBuffer.c_str() + keyBegin, keyEnd - keyBegin) == m_dwCode)
             {
                 message = EntryText(m_strBuffer.substr(comma + 1, lineFeed - comma - 1));
                 return true;
             }
-            m_strBuffer.erase(0, lineFeed + 1);
-            m_nCommaFrom = 0;
-            m_nLineFeedFrom = 0;
-            DropLeadingLineFeeds();
+            m_nStart = lineFeed + 1;
+            SkipLineFeeds();
         }
     }
 
-    void DropLeadingLineFeeds()
+    void SkipLineFeeds()
     {
-        const size_t n = std::min(m_strBuffer.find_first_not_of(L'\n'), m_strBuffer.size());
-        if (n == 0)
-            return;
-        m_strBuffer.erase(0, n);
-        m_nCommaFrom = m_nCommaFrom > n ? m_nCommaFrom - n : 0;
-        m_nLineFeedFrom = m_nLineFeedFrom > n ? m_nLineFeedFrom - n : 0;
+        while (m_nStart < m_strBuffer.size() && m_strBuffer[m_nStart] == L'\n')
+            ++m_nStart;
+        m_nCommaFrom = std::max(m_nCommaFrom, m_nStart);
+        m_nLineFeedFrom = std::max(m_nLineFeedFrom, m_nStart);
     }
 
     const DWORD m_dwCode;
     ustring m_strBuffer;
-    size_t m_nCommaFrom;    // no comma before this position
+    size_t m_nStart;        // the first unit not consumed yet
+    size_t m_nCommaFrom;    // no comma between m_nStart and this position
     size_t m_nLineFeedFrom; // no line feed between the first comma and this position
 };
 
