@@ -143,15 +143,14 @@ ustring operator+(wchar_t a, const ustring& b)
 
 namespace
 {
-// The Win32 conversions take a 32-bit count; npos means "to and including the terminator" (-1).
-// Longer inputs than INT_MAX cannot be passed and convert to nothing.
-bool ToWin32Length(size_t len, int& out)
+// The Win32 conversions take a 32-bit count. npos means "up to the terminator": the length is measured
+// here instead of passing -1, because Wine's UTF-8 decoder folds the terminator into an incomplete
+// sequence that stands right before it, which would cost a character or add one. Longer inputs than
+// INT_MAX cannot be passed and convert to nothing.
+template <class Char> bool ToWin32Length(const Char* s, size_t len, int& out)
 {
     if (len == ustring::npos)
-    {
-        out = -1;
-        return true;
-    }
+        len = std::char_traits<Char>::length(s);
     if (len > static_cast<size_t>(INT_MAX))
         return false;
     out = static_cast<int>(len);
@@ -163,7 +162,7 @@ ustring ustring::MultiByteToWideChar(const char* s, size_t len, unsigned int cod
 {
     ustring result;
     int n = 0;
-    if (s == NULL || !ToWin32Length(len, n))
+    if (s == NULL || !ToWin32Length(s, len, n) || n == 0)
         return result;
     const int needed = ::MultiByteToWideChar(codePage, flags, s, n, NULL, 0);
     if (needed < 1)
@@ -173,8 +172,6 @@ ustring ustring::MultiByteToWideChar(const char* s, size_t len, unsigned int cod
     if (written < 1)
         return ustring();
     result.resize(static_cast<size_t>(written));
-    if (len == npos && !result.empty())
-        result.resize(result.size() - 1);
     return result;
 }
 
@@ -188,7 +185,7 @@ std::string ustring::WideCharToMultiByte(const wchar_t* s, size_t len, unsigned 
 {
     std::string result;
     int n = 0;
-    if (s == NULL || !ToWin32Length(len, n))
+    if (s == NULL || !ToWin32Length(s, len, n) || n == 0)
         return result;
     const int needed = ::WideCharToMultiByte(codePage, flags, s, n, NULL, 0, NULL, NULL);
     if (needed < 1)
@@ -198,8 +195,6 @@ std::string ustring::WideCharToMultiByte(const wchar_t* s, size_t len, unsigned 
     if (written < 1)
         return std::string();
     result.resize(static_cast<size_t>(written));
-    if (len == npos && !result.empty())
-        result.resize(result.size() - 1);
     return result;
 }
 

@@ -297,6 +297,28 @@ void ustring::Bin2Hex(const std::vector<unsigned char>& bytes, ustring& hex)
     }
 }
 
+namespace
+{
+// The value of a hexadecimal digit as the runtime classifies them (iswxdigit), or -1. Beyond ASCII the
+// runtime also counts the full-width forms of 0-9, A-F and a-f; they read as their ASCII originals.
+int HexDigitValue(wchar_t c)
+{
+    if (c > 0x7F)
+    {
+        if (!::iswxdigit(c) || c < 0xFF10 || c > 0xFF46)
+            return -1;
+        c = static_cast<wchar_t>(c - 0xFEE0);
+    }
+    if (c >= L'0' && c <= L'9')
+        return c - L'0';
+    if (c >= L'a' && c <= L'f')
+        return c - L'a' + 10;
+    if (c >= L'A' && c <= L'F')
+        return c - L'A' + 10;
+    return -1;
+}
+} // namespace
+
 bool ustring::Hex2Bin(const ustring& hex, std::vector<unsigned char>& bytes)
 {
     bytes.clear();
@@ -304,17 +326,11 @@ bool ustring::Hex2Bin(const ustring& hex, std::vector<unsigned char>& bytes)
     int high = -1;
     for (wchar_t c : static_cast<const base_type&>(hex))
     {
-        int v;
-        if (c >= L'0' && c <= L'9')
-            v = c - L'0';
-        else if (c >= L'a' && c <= L'f')
-            v = c - L'a' + 10;
-        else if (c >= L'A' && c <= L'F')
-            v = c - L'A' + 10;
-        else if (c == L' ' || c == L'\r' || c == L'\n' || c == L'\t')
-            continue;
-        else
+        const int v = HexDigitValue(c);
+        if (v < 0)
         {
+            if (c == L' ' || c == L'\r' || c == L'\n' || c == L'\t')
+                continue;
             bytes.clear();
             return false;
         }
@@ -343,8 +359,10 @@ bool ustring::GUID2String(const GUID& guid, ustring& text)
 
 bool ustring::String2GUID(const wchar_t* text, GUID& guid)
 {
-    // CLSIDFromString takes a non-const pointer in older headers; it does not write through it.
-    if (text == NULL || FAILED(::CLSIDFromString(const_cast<LPOLESTR>(text), &guid)))
+    // CLSIDFromString takes a non-const pointer in older headers; it does not write through it. A null
+    // text is its way of writing the null GUID, and succeeds. On failure it may have written part of
+    // the GUID already.
+    if (FAILED(::CLSIDFromString(const_cast<LPOLESTR>(text), &guid)))
     {
         guid = GUID();
         return false;
