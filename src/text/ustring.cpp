@@ -252,29 +252,32 @@ void ustring::vsprintf(const wchar_t* format, va_list args)
     if (format == NULL)
         throw std::invalid_argument("ustring::vsprintf: null format");
 
-    // The text is built in a separate buffer and swapped in at the end, so an argument may point into
-    // this string (its current text is a natural argument).
-    ustring buffer(1024, L'\0');
+    // The text is built in a separate buffer and only then copied in, so an argument may point into
+    // this string (its current text is a natural argument). Up to 1024 units that buffer is on the
+    // stack and the copy reuses this string's own storage: no allocation for the usual short texts.
+    wchar_t local[1024];
     va_list attempt;
     va_copy(attempt, args);
-    int n = ::_vsnwprintf(&buffer.base_type::operator[](0), buffer.size(), format, attempt);
+    int n = ::_vsnwprintf(local, 1024, format, attempt);
+    va_end(attempt);
+    if (n >= 0)
+    {
+        assign(local, static_cast<size_t>(n));
+        return;
+    }
+    // The legacy formatter only says "did not fit"; ask for the exact length once instead of doubling
+    // blindly. A negative answer means the format itself is invalid.
+    va_copy(attempt, args);
+    const int needed = ::_vscwprintf(format, attempt);
+    va_end(attempt);
+    if (needed < 0)
+        throw std::invalid_argument("ustring::vsprintf: invalid format");
+    ustring buffer(static_cast<size_t>(needed) + 1, L'\0');
+    va_copy(attempt, args);
+    n = ::_vsnwprintf(&buffer.base_type::operator[](0), buffer.size(), format, attempt);
     va_end(attempt);
     if (n < 0)
-    {
-        // The legacy formatter only says "did not fit"; ask for the exact length once instead of
-        // doubling blindly. A negative answer means the format itself is invalid.
-        va_copy(attempt, args);
-        const int needed = ::_vscwprintf(format, attempt);
-        va_end(attempt);
-        if (needed < 0)
-            throw std::invalid_argument("ustring::vsprintf: invalid format");
-        buffer.assign(static_cast<size_t>(needed) + 1, L'\0');
-        va_copy(attempt, args);
-        n = ::_vsnwprintf(&buffer.base_type::operator[](0), buffer.size(), format, attempt);
-        va_end(attempt);
-        if (n < 0)
-            throw std::invalid_argument("ustring::vsprintf: invalid format");
-    }
+        throw std::invalid_argument("ustring::vsprintf: invalid format");
     buffer.resize(static_cast<size_t>(n));
     swap(buffer);
 }

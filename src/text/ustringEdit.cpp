@@ -3,6 +3,7 @@
 #include <objbase.h>
 
 #include <algorithm>
+#include <array>
 #include <cwchar>
 #include <cwctype>
 
@@ -80,21 +81,19 @@ ustring& ustring::trim_right(const std::vector<wchar_t>& set)
 
 namespace
 {
-void AddPiece(std::list<ustring>& out, ustring&& piece)
+// Each piece is built in its place in the container, without an intermediate string.
+template <class Sequence> void AddPiece(Sequence& out, const wchar_t* p, size_t n)
 {
-    out.push_back(std::move(piece));
+    out.emplace_back();
+    out.back().assign(p, n);
 }
-void AddPiece(std::vector<ustring>& out, ustring&& piece)
+void AddPiece(std::set<ustring, LessStrCaseSensitiveW>& out, const wchar_t* p, size_t n)
 {
-    out.push_back(std::move(piece));
-}
-void AddPiece(std::set<ustring, LessStrCaseSensitiveW>& out, ustring&& piece)
-{
-    out.insert(std::move(piece));
+    out.insert(ustring(p, n));
 }
 
-template <class C> void SplitAt(const ustring& s, const wchar_t* delimiter, size_t delimiterLength, C& out,
-                                bool keepLastEmpty)
+template <class C>
+void SplitAt(const ustring& s, const wchar_t* delimiter, size_t delimiterLength, C& out, bool keepLastEmpty)
 {
     out.clear();
     if (s.empty())
@@ -102,7 +101,7 @@ template <class C> void SplitAt(const ustring& s, const wchar_t* delimiter, size
     if (delimiterLength == 0)
     {
         // Nothing can separate the text: it is one piece.
-        AddPiece(out, ustring(s));
+        AddPiece(out, s.data(), s.size());
         return;
     }
     size_t pos = 0;
@@ -111,15 +110,15 @@ template <class C> void SplitAt(const ustring& s, const wchar_t* delimiter, size
         const size_t found = s.find(delimiter, pos, delimiterLength);
         if (found == ustring::npos)
         {
-            AddPiece(out, ustring(s.substr(pos)));
+            AddPiece(out, s.data() + pos, s.size() - pos);
             return;
         }
-        AddPiece(out, ustring(s.substr(pos, found - pos)));
+        AddPiece(out, s.data() + pos, found - pos);
         pos = found + delimiterLength;
         if (pos >= s.size())
         {
             if (keepLastEmpty)
-                AddPiece(out, ustring());
+                AddPiece(out, s.data(), 0);
             return;
         }
     }
@@ -145,18 +144,19 @@ template <class C> void ustring::split(const ustring& s, C& out)
     while (p < end && *p != L'\0')
     {
         const size_t n = std::wcslen(p);
-        AddPiece(out, ustring(p, n));
+        AddPiece(out, p, n);
         p += n + 1;
     }
 }
 
 template OSTRAND_API void ustring::split(const ustring&, const wchar_t*, std::list<ustring>&, bool);
 template OSTRAND_API void ustring::split(const ustring&, const wchar_t*, std::vector<ustring>&, bool);
-template OSTRAND_API void ustring::split(const ustring&, const wchar_t*, std::set<ustring, LessStrCaseSensitiveW>&,
-                                         bool);
+template OSTRAND_API void ustring::split(const ustring&, const wchar_t*,
+                                         std::set<ustring, LessStrCaseSensitiveW>&, bool);
 template OSTRAND_API void ustring::split(const ustring&, wchar_t, std::list<ustring>&, bool);
 template OSTRAND_API void ustring::split(const ustring&, wchar_t, std::vector<ustring>&, bool);
-template OSTRAND_API void ustring::split(const ustring&, wchar_t, std::set<ustring, LessStrCaseSensitiveW>&, bool);
+template OSTRAND_API void ustring::split(const ustring&, wchar_t, std::set<ustring, LessStrCaseSensitiveW>&,
+                                         bool);
 template OSTRAND_API void ustring::split(const ustring&, std::list<ustring>&);
 template OSTRAND_API void ustring::split(const ustring&, std::vector<ustring>&);
 template OSTRAND_API void ustring::split(const ustring&, std::set<ustring, LessStrCaseSensitiveW>&);
@@ -299,23 +299,32 @@ void ustring::Bin2Hex(const std::vector<unsigned char>& bytes, ustring& hex)
 
 namespace
 {
-// The value of a hexadecimal digit as the runtime classifies them (iswxdigit), or -1. Beyond ASCII the
-// runtime also counts the full-width forms of 0-9, A-F and a-f; they read as their ASCII originals.
+const signed char kNotHex = -1;
+const signed char kBlank = -2; // skipped anywhere, also between the two digits of a pair
+
+constexpr std::array<signed char, 128> MakeAsciiHexTable()
+{
+    std::array<signed char, 128> t{};
+    for (int c = 0; c < 128; ++c)
+        t[c] = kNotHex;
+    for (int c = '0'; c <= '9'; ++c)
+        t[c] = static_cast<signed char>(c - '0');
+    for (int c = 'a'; c <= 'f'; ++c)
+        t[c] = t[c - 'a' + 'A'] = static_cast<signed char>(c - 'a' + 10);
+    t[' '] = t['\r'] = t['\n'] = t['\t'] = kBlank;
+    return t;
+}
+constexpr std::array<signed char, 128> kAsciiHex = MakeAsciiHexTable();
+
+// A digit's value, kBlank or kNotHex. The digits are those the runtime classifies with iswxdigit:
+// beyond ASCII also the full-width forms of 0-9, A-F and a-f, which read as their ASCII originals.
 int HexDigitValue(wchar_t c)
 {
-    if (c > 0x7F)
-    {
-        if (!::iswxdigit(c) || c < 0xFF10 || c > 0xFF46)
-            return -1;
-        c = static_cast<wchar_t>(c - 0xFEE0);
-    }
-    if (c >= L'0' && c <= L'9')
-        return c - L'0';
-    if (c >= L'a' && c <= L'f')
-        return c - L'a' + 10;
-    if (c >= L'A' && c <= L'F')
-        return c - L'A' + 10;
-    return -1;
+    if (c < 0x80)
+        return kAsciiHex[c];
+    if (c < 0xFF10 || c > 0xFF46 || !::iswxdigit(c))
+        return kNotHex;
+    return kAsciiHex[c - 0xFEE0];
 }
 } // namespace
 
@@ -329,7 +338,7 @@ bool ustring::Hex2Bin(const ustring& hex, std::vector<unsigned char>& bytes)
         const int v = HexDigitValue(c);
         if (v < 0)
         {
-            if (c == L' ' || c == L'\r' || c == L'\n' || c == L'\t')
+            if (v == kBlank)
                 continue;
             bytes.clear();
             return false;
