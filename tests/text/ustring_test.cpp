@@ -48,6 +48,7 @@ TEST(UstringTest, BstrKeepsEmbeddedZerosAndNullIsEmpty)
     const ustring u(withZeros);
     EXPECT_EQ(ustring(kUnits, 5), u);
     EXPECT_EQ(5u, u.size());
+    EXPECT_EQ(ustring(L"wide"), ustring(_bstr_t(L"wide")));
     EXPECT_TRUE(ustring(_bstr_t()).empty());
     EXPECT_TRUE(ustring(_bstr_t(static_cast<BSTR>(nullptr), false)).empty());
 
