@@ -174,17 +174,14 @@ TEST(CWSASocketTest, CloseReleasesTheObjectEvenWhenWinsockRefuses)
     char buffer[4];
     ExpectWinException([&] { empty.Recv(buffer, sizeof buffer, n, flags); }, L"WSARecv", WSAENOTSOCK);
     ExpectWinException([&] { empty.Listen(1); }, L"listen", WSAENOTSOCK);
-}
 
-TEST(CWSASocketTest, DetachHandsOverTheSocketWithoutClosingIt)
-{
+    // Detach hands the socket over without closing it.
     CWSASocket a;
     a.Create(AF_INET, SOCK_DGRAM, IPPROTO_UDP);
-    const SOCKET raw = a.Detach();
+    CWSASocket b(a.Detach());
     EXPECT_FALSE(a.IsCreated());
-    CWSASocket b(raw);
     int type = 0;
-    b.GetSockOptLL(SOL_SOCKET, SO_TYPE, &type, sizeof type); // still a live socket
+    b.GetSockOptLL(SOL_SOCKET, SO_TYPE, &type, sizeof type);
     EXPECT_EQ(SOCK_DGRAM, type);
 }
 
@@ -257,9 +254,6 @@ TEST_F(SocketTest, SelectPollsTimesOutAndBlocksUntilDataArrives)
     FD_SET(static_cast<SOCKET>(server), &r);
     EXPECT_EQ(0, CWSASocket::Select(r, w, e, 0));
 
-    FD_SET(static_cast<SOCKET>(server), &r);
-    fd_set none;
-    FD_ZERO(&none);
     const DWORD t0 = ::GetTickCount();
     // Nothing to wait for but the time-out: 1 s and 500,000 us.
     FD_ZERO(&r);
@@ -276,23 +270,18 @@ TEST_F(SocketTest, SelectPollsTimesOutAndBlocksUntilDataArrives)
     unsigned long pending = 0;
     server.IoctlSocket(FIONREAD, pending);
     EXPECT_EQ(1u, pending);
-    server.Shutdown(SD_SEND);
-}
 
-TEST_F(SocketTest, EventSelectSignalsArrivingData)
-{
-    StartPeer(200, "ping");
-    CWSASocket server(listener.AcceptLL(NULL, 0));
+    // The same arrival seen through an event: the peer's echo of what we send now.
     CWSAEvent event;
-    server.EventSelect(event.GetHandle(), FD_READ | FD_CLOSE);
+    server.EventSelect(event.GetHandle(), FD_READ);
+    char c;
+    unsigned __int64 n = 0;
+    DWORD flags = 0;
+    ASSERT_TRUE(server.Recv(&c, 1, n, flags)); // re-enables FD_READ
+    ASSERT_TRUE(server.Send("y", 1, n));
     WSAEVENT h = event.GetHandle();
     ASSERT_EQ(WSA_WAIT_EVENT_0, ::WSAWaitForMultipleEvents(1, &h, TRUE, 10000, FALSE));
-    WSANETWORKEVENTS events;
-    ASSERT_EQ(0, ::WSAEnumNetworkEvents(server, h, &events));
-    EXPECT_TRUE(events.lNetworkEvents & FD_READ);
     server.EventSelect(NULL, 0);
-    unsigned long blocking = 0;
-    server.IoctlSocket(FIONBIO, blocking);
     server.Shutdown(SD_SEND);
 }
 
