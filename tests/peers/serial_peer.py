@@ -23,8 +23,10 @@ escapes \\r \\n \\t \\xHH \\\\):
     close                  send what is still queued, then close the line (the master)
     hold                   stay silent until told to stop
 
-Status lines go to the status file (to stdout without --dir): "READY <port> <slave>" once the link exists, then
-"DONE ok" or "DONE fail: <reason>" at the end. The peer stops when the stop file appears, on SIGTERM or
+With --dir the peer works in that folder: "status", "stop", "received" (the default record file) and
+"peer.log", which takes the peer's own output. Status lines go to the status file (to stdout without
+--dir): "READY <port> <slave>" once the link exists, then "DONE ok" or "DONE fail: <reason>" at the
+end. The peer stops when the stop file appears, on SIGTERM or
 SIGINT, when stdin is a pipe that reaches its end (--stdin-stop), or when --timeout expires, whichever
 comes first; "close" ends it too. A failed command (an expect that timed out) is reported at the end,
 while the line stays open until the stop, so the Windows side never sees a hang-up it did not ask for.
@@ -276,7 +278,7 @@ def main():
     parser = argparse.ArgumentParser(description="Serial peer on a pseudo-terminal for the Wine tests.")
     parser.add_argument("--port", required=True, help="port name, e.g. com5")
     parser.add_argument("--prefix", help="Wine prefix (default $WINEPREFIX, else Wine's own ~/.wine)")
-    parser.add_argument("--dir", help="work folder: status and stop files, default record file")
+    parser.add_argument("--dir", help="work folder: status, stop, log and default record file")
     parser.add_argument("--script", help="script file ('-' for stdin)")
     parser.add_argument("-e", dest="commands", action="append", default=[], help="script command(s)")
     parser.add_argument("--record", help="file receiving what arrives (default WORKDIR/received)")
@@ -289,6 +291,13 @@ def main():
         parser.error("%s is not a Wine prefix (it has no dosdevices folder)" % args.prefix)
     if args.record is None and args.dir:
         args.record = os.path.join(args.dir, "received")
+    if args.dir:
+        # Whoever started the peer may be waiting for the end of its own output (a test runner reading a
+        # pipe): keep the peer's output, tracebacks included, in the work folder instead.
+        log = os.open(os.path.join(args.dir, "peer.log"), os.O_WRONLY | os.O_CREAT | os.O_APPEND, 0o644)
+        os.dup2(log, 1)
+        os.dup2(log, 2)
+        os.close(log)
 
     text = "\n".join(args.commands)
     if args.script == "-":

@@ -55,7 +55,7 @@ protected:
         const std::wstring dir = Windows(m_strDir);
         ::CreateDirectoryW(Windows(OSTRAND_SERIAL_PEER_DIR).c_str(), NULL);
         ::CreateDirectoryW(dir.c_str(), NULL);
-        for (const wchar_t* name : {L"\\status", L"\\received", L"\\stop", L"\\script"})
+        for (const wchar_t* name : {L"\\status", L"\\received", L"\\stop", L"\\script", L"\\peer.log"})
             ::DeleteFileW((dir + name).c_str());
         if (!WriteAll(dir + L"\\script", script))
             return ::testing::AssertionFailure() << "cannot write the peer's script in " << m_strDir;
@@ -64,6 +64,8 @@ protected:
                                L" --port com" + std::to_wstring(port) + L" --dir " + Quote(Wide(m_strDir)) +
                                L" --script " + Quote(Wide(m_strDir + "/script")) + L" --timeout " +
                                std::to_wstring(static_cast<int>(timeout));
+        // The peer moves its own output into its work folder (peer.log): Wine hands a Unix program the
+        // test's standard error whatever the startup record says.
         STARTUPINFOW startup = {};
         startup.cb = sizeof(startup);
         PROCESS_INFORMATION process = {};
@@ -79,7 +81,8 @@ protected:
         const std::string status = WaitForStatus("READY", 20000);
         if (status.empty())
             return ::testing::AssertionFailure()
-                   << "the peer did not report READY in " << m_strDir << "; status: " << Status();
+                   << "the peer did not report READY in " << m_strDir << "; status: " << Status()
+                   << "; log: " << ReadAll(dir + L"\\peer.log");
         return ::testing::AssertionSuccess();
     }
 
@@ -100,25 +103,12 @@ protected:
     }
 
     // Everything the peer has received so far.
+    std::string ReceivedText() const { return ReadAll(Windows(m_strDir) + L"\\received"); }
+
     std::vector<unsigned char> Received() const
     {
-        std::vector<unsigned char> bytes;
-        HANDLE file = ::CreateFileW((Windows(m_strDir) + L"\\received").c_str(), GENERIC_READ,
-                                    FILE_SHARE_READ | FILE_SHARE_WRITE, NULL, OPEN_EXISTING, 0, NULL);
-        if (file == INVALID_HANDLE_VALUE)
-            return bytes;
-        unsigned char buffer[65536];
-        DWORD n = 0;
-        while (::ReadFile(file, buffer, sizeof(buffer), &n, NULL) && n > 0)
-            bytes.insert(bytes.end(), buffer, buffer + n);
-        ::CloseHandle(file);
-        return bytes;
-    }
-
-    std::string ReceivedText() const
-    {
-        const std::vector<unsigned char> bytes = Received();
-        return std::string(bytes.begin(), bytes.end());
+        const std::string bytes = ReceivedText();
+        return std::vector<unsigned char>(bytes.begin(), bytes.end());
     }
 
     void TearDown() override
@@ -157,15 +147,17 @@ private:
         }
     }
 
-    std::string Status() const
+    std::string Status() const { return ReadAll(Windows(m_strDir) + L"\\status"); }
+
+    static std::string ReadAll(const std::wstring& path)
     {
         std::string text;
-        HANDLE file = ::CreateFileW((Windows(m_strDir) + L"\\status").c_str(), GENERIC_READ,
-                                    FILE_SHARE_READ | FILE_SHARE_WRITE | FILE_SHARE_DELETE, NULL,
-                                    OPEN_EXISTING, 0, NULL);
+        HANDLE file =
+            ::CreateFileW(path.c_str(), GENERIC_READ, FILE_SHARE_READ | FILE_SHARE_WRITE | FILE_SHARE_DELETE,
+                          NULL, OPEN_EXISTING, 0, NULL);
         if (file == INVALID_HANDLE_VALUE)
             return text;
-        char buffer[4096];
+        char buffer[65536];
         DWORD n = 0;
         while (::ReadFile(file, buffer, sizeof(buffer), &n, NULL) && n > 0)
             text.append(buffer, n);
