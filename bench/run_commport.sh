@@ -25,7 +25,7 @@ trap cleanup EXIT INT TERM
 # The peer links into dosdevices, which must exist before the prefix is first used; Wine fills in the rest.
 mkdir -p "$prefix/dosdevices"
 python3 "$here/../tests/peers/serial_peer.py" --port "$port" --prefix "$prefix" --dir "$work" \
-    --record /dev/null --timeout 900 -e echo >"$work/peer.log" 2>&1 &
+    --record /dev/null --timeout 900 -e echo >"$work/peer.out" 2>&1 &
 peer=$!
 
 i=0
@@ -33,7 +33,7 @@ until grep -q '^READY' "$work/status" 2>/dev/null; do
     i=$((i + 1))
     if [ $i -gt 100 ] || ! kill -0 "$peer" 2>/dev/null; then
         echo "the serial peer did not start:" >&2
-        cat "$work/peer.log" >&2
+        cat "$work/peer.out" "$work/peer.log" >&2 2>/dev/null
         exit 1
     fi
     sleep 0.1
