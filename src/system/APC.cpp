@@ -1,6 +1,7 @@
 #include <ostrand/system/APC.h>
 #include <ostrand/system/Thread.h>
 
+#include "internal/MessagePump.h"
 #include "internal/throw.h"
 
 namespace ostrand
@@ -8,50 +9,6 @@ namespace ostrand
 
 namespace
 {
-
-// Which messages each queue-status bit lets through. A row covers the inclusive range [first, last].
-struct MaskRow
-{
-    DWORD flag;
-    UINT first;
-    UINT last;
-};
-
-const MaskRow g_aMaskRows[] = {
-    {QS_KEY, WM_KEYDOWN, WM_KEYUP},             // 0x100, 0x101
-    {QS_KEY, WM_SYSKEYDOWN, WM_SYSKEYUP},       // 0x104, 0x105
-    {QS_MOUSEMOVE, WM_MOUSEMOVE, WM_MOUSEMOVE}, // 0x200
-    {QS_MOUSEBUTTON, 0x201, 0x209},             // the button messages
-    {QS_TIMER, WM_TIMER, WM_TIMER},
-    {QS_PAINT, WM_PAINT, WM_PAINT},
-    {QS_HOTKEY, WM_HOTKEY, WM_HOTKEY},
-    // Application messages from WM_USER on, and every value negative as a signed 32-bit number.
-    {QS_POSTMESSAGE, WM_USER, 0xFFFFFFFFu},
-};
-
-// Keeps a WM_QUIT that the pump removed and posts it again when the pump is left, however it is left.
-class QuitKeeper
-{
-public:
-    QuitKeeper() : m_bSeen(false), m_nExitCode(0) {}
-    ~QuitKeeper()
-    {
-        if (m_bSeen)
-            ::PostQuitMessage(m_nExitCode);
-    }
-    void Keep(const MSG& msg)
-    {
-        m_bSeen = true;
-        m_nExitCode = static_cast<int>(msg.wParam);
-    }
-
-    QuitKeeper(const QuitKeeper&) = delete;
-    QuitKeeper& operator=(const QuitKeeper&) = delete;
-
-private:
-    bool m_bSeen;
-    int m_nExitCode;
-};
 
 // ERROR_UNHANDLED_EXCEPTION, which the MinGW headers lack: the worker's exit code when Run threw.
 const DWORD kRunThrew = 574;
@@ -62,10 +19,7 @@ CAPC::CAPC(DWORD mask) : m_dwMask(mask) {}
 
 bool CAPC::TestMessage(UINT message) const
 {
-    for (const MaskRow& row : g_aMaskRows)
-        if ((m_dwMask & row.flag) != 0 && message >= row.first && message <= row.last)
-            return true;
-    return false;
+    return detail::MaskPasses(m_dwMask, message);
 }
 
 DWORD CAPC::ThreadProc(void* object)
@@ -103,14 +57,9 @@ DWORD CAPC::Invoke()
     worker.Create(&CAPC::ThreadProc, this);
     HANDLE thread = worker.GetHandle();
 
-    // WM_PAINT stays queued until the window is validated, so when paint is not dispatched the peek
-    // must not see it, or the removal loop below would never end.
-    const UINT peekFlags = (m_dwMask & QS_PAINT) != 0
-                               ? PM_REMOVE
-                               : PM_REMOVE | PM_QS_INPUT | PM_QS_POSTMESSAGE | PM_QS_SENDMESSAGE;
     try
     {
-        QuitKeeper quit;
+        detail::MessagePump pump(m_dwMask);
         for (;;)
         {
             const DWORD r = ::MsgWaitForMultipleObjects(1, &thread, FALSE, INFINITE, m_dwMask);
@@ -121,17 +70,7 @@ DWORD CAPC::Invoke()
                 DWORD code = 0;
                 if (::GetExitCodeThread(thread, &code) && code != STILL_ACTIVE)
                     break;
-                MSG msg;
-                while (::PeekMessageW(&msg, NULL, 0, 0, peekFlags))
-                {
-                    if (TestMessage(msg.message))
-                    {
-                        ::TranslateMessage(&msg);
-                        ::DispatchMessageW(&msg);
-                    }
-                    else if (msg.message == WM_QUIT)
-                        quit.Keep(msg);
-                }
+                pump.Drain();
                 continue;
             }
             if (r == WAIT_FAILED)

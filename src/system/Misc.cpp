@@ -1,5 +1,6 @@
 #include <ostrand/system/Misc.h>
 
+#include "internal/MessagePump.h"
 #include "internal/throw.h"
 
 namespace ostrand
@@ -17,54 +18,12 @@ void Sleep(DWORD milliseconds, CEvent& cancel)
     OSTRAND_THROW_WIN(L"WaitForSingleObject", ERROR_INTERNAL_ERROR);
 }
 
-namespace
-{
-
-// Removes every queued message of the thread and dispatches only the repaints. A WM_QUIT is kept and
-// posted again when the wait is left, however it is left.
-class PaintPump
-{
-public:
-    PaintPump() : m_bQuit(false), m_nExitCode(0) {}
-    ~PaintPump()
-    {
-        if (m_bQuit)
-            ::PostQuitMessage(m_nExitCode);
-    }
-
-    void Drain()
-    {
-        MSG msg;
-        while (::PeekMessageW(&msg, NULL, 0, 0, PM_REMOVE))
-        {
-            if (msg.message == WM_PAINT)
-            {
-                ::TranslateMessage(&msg);
-                ::DispatchMessageW(&msg);
-            }
-            else if (msg.message == WM_QUIT)
-            {
-                m_bQuit = true;
-                m_nExitCode = static_cast<int>(msg.wParam);
-            }
-        }
-    }
-
-    PaintPump(const PaintPump&) = delete;
-    PaintPump& operator=(const PaintPump&) = delete;
-
-private:
-    bool m_bQuit;
-    int m_nExitCode;
-};
-
-} // namespace
-
 void MsgSleep(DWORD milliseconds, CEvent& cancel)
 {
     const DWORD start = ::GetTickCount();
     HANDLE handle = cancel.GetHandle();
-    PaintPump pump;
+    // Repaints are dispatched, everything else is dropped.
+    detail::MessagePump pump(QS_PAINT);
     for (;;)
     {
         DWORD timeout = INFINITE;
