@@ -15,7 +15,6 @@
 
 using ostrand::CCommPort;
 using ostrand::COverlapped;
-using ostrand::CWinException;
 using systest::CatchWin;
 using systest::ExpectPayload;
 
@@ -111,8 +110,12 @@ TEST_F(CCommPortTest, OpensClosesAndReopens)
     EXPECT_FALSE(port.IsCreated());
 
     port.Open(PortName().c_str(), 0);
-    port.Open(PortName().c_str(), 0); // closes the first handle, or the exclusive reopen would conflict
+    const HANDLE first = port.GetHandle();
+    port.Open(PortName().c_str(), 0);
     ASSERT_TRUE(port.IsCreated());
+    // Open on an open port closes the old handle: either its value was reused or it is gone.
+    DWORD flags = 0;
+    EXPECT_TRUE(port.GetHandle() == first || !::GetHandleInformation(first, &flags));
     WriteText(port, "TWO");
     EXPECT_EQ("ok", StopPeer());
     EXPECT_EQ("ONETWO", ReceivedText());
@@ -438,7 +441,7 @@ TEST_F(CCommPortTest, PurgeClearErrorAndTransmitChar)
     port.ClearCommError(errors, status);
     EXPECT_EQ(0u, status.cbInQue);
 
-    // The character jumps the queue; the peer answers only once it sees it.
+    // The peer answers only once it sees the character; the purged "abcdef" must not come first.
     port.TransmitCommChar('Z');
     EXPECT_EQ("gh", ReadText(port, 2));
     EXPECT_EQ("ok", StopPeer());
