@@ -37,8 +37,8 @@ inline std::vector<unsigned char> Pattern(size_t count)
 class SerialPeerTest : public ::testing::Test
 {
 protected:
-    // The port the peer links unless a test asks for another.
-    static constexpr int kPort = 5;
+    // The port the peer links unless a test asks for another; the demo's simulated instrument uses COM5.
+    static constexpr int kPort = 7;
 
     static std::wstring PortName(int port = kPort) { return L"COM" + std::to_wstring(port); }
 
