@@ -31,7 +31,11 @@ SIGINT, when stdin is a pipe that reaches its end (--stdin-stop), or when --time
 comes first; "close" ends it too. A failed command (an expect that timed out) is reported at the end,
 while the line stays open until the stop, so the Windows side never sees a hang-up it did not ask for.
 
-Exit status: 0 ok, 1 a script command failed, 2 usage error, 3 timed out.
+A stop ends an open-ended wait (hold, echo without a count, the silence after the script) at once; a
+script command still under way gets two seconds to finish, or the peer reports "stopped during" it.
+Before it ends, the peer takes in whatever is still arriving.
+
+Exit status: 0 ok, 1 a script command failed or did not finish, 2 usage error, 3 timed out.
 """
 
 import argparse
@@ -46,6 +50,7 @@ import time
 import tty
 
 PATTERN_PERIOD = 251
+STOP_GRACE = 2.0  # seconds a running script command may still take after the stop
 
 
 def pattern(start, count):
@@ -113,6 +118,8 @@ class Peer:
         self.master = -1
         self.slave = -1
         self.link = None
+        self.stopping_since = None
+        self.command = None  # the script command under way; None in an open-ended wait
 
     # Status
 
@@ -157,12 +164,19 @@ class Peer:
     # The event loop
 
     def check_stop(self):
-        if self.stop_requested:
-            raise Stop("stopped")
-        if self.stop_file and os.path.exists(self.stop_file):
-            raise Stop("stopped")
         if time.monotonic() >= self.deadline:
-            raise Stop("timeout")
+            raise Stop("timed out")
+        if self.stopping_since is None:
+            if self.stop_requested or (self.stop_file and os.path.exists(self.stop_file)):
+                self.stopping_since = time.monotonic()
+            else:
+                return
+        # Told to stop: an open-ended command ends now; a script command still under way gets a grace
+        # period to finish (bytes written just before the stop may still be on their way).
+        if self.command is None:
+            raise Stop(None)
+        if time.monotonic() - self.stopping_since >= STOP_GRACE:
+            raise Stop("stopped during %s" % self.command)
 
     def pump(self, timeout):
         """Moves bytes once: waits at most `timeout` seconds for the line (or stdin)."""
@@ -193,17 +207,19 @@ class Peer:
                 pass
 
     def receive(self):
+        """Reads what has arrived; returns the byte count."""
         try:
             data = os.read(self.master, 65536)
         except BlockingIOError:
-            return
+            return 0
         except OSError as e:
             if e.errno == errno.EIO:  # no slave open: nothing to read
                 time.sleep(0.005)
-                return
+                return 0
             raise
         if not data:
-            return
+            return 0
+        count = len(data)
         if self.record:
             self.record.write(data)
             self.record.flush()
@@ -214,6 +230,7 @@ class Peer:
                 self.echo_left -= len(echoed)
             data = data[len(echoed) :]
         self.pending += data
+        return count
 
     def wait_until(self, condition, seconds, what):
         end = time.monotonic() + seconds
@@ -226,8 +243,19 @@ class Peer:
 
     def run(self, commands):
         for name, args in commands:
+            self.command = " ".join([name] + [repr(a) for a in args])
             getattr(self, "do_" + name)(*args)
+            self.command = None
             if self.master < 0:
+                return
+
+    def drain(self):
+        """Takes in what is still arriving, until the line has been quiet for a moment."""
+        while self.master >= 0:
+            readable, _, _ = select.select([self.master], [], [], 0.05)
+            if not readable:
+                return
+            if self.receive() == 0:
                 return
 
     def do_send(self, text):
@@ -270,6 +298,7 @@ class Peer:
         self.close_line()
 
     def do_hold(self):
+        self.command = None
         while True:
             self.pump(1.0)
 
@@ -320,7 +349,7 @@ def main():
     signal.signal(signal.SIGINT, on_signal)
 
     failure = None
-    end = "ok"
+    status = 0
     try:
         peer.open_line()
         try:
@@ -329,21 +358,18 @@ def main():
                 peer.do_hold()
         except Failed as e:
             failure = str(e)
+            status = 1
             peer.do_hold()
     except Stop as e:
-        if e.reason == "timeout":
-            end = "timeout"
+        if e.reason and not failure:
+            failure = e.reason
+            status = 3 if e.reason == "timed out" else 1
+        peer.drain()
     finally:
         peer.remove_link()
         peer.close_line()
-    if failure:
-        peer.say("DONE fail: " + failure)
-        return 1
-    if end == "timeout":
-        peer.say("DONE fail: timed out")
-        return 3
-    peer.say("DONE ok")
-    return 0
+    peer.say("DONE fail: " + failure if failure else "DONE ok")
+    return status
 
 
 if __name__ == "__main__":
