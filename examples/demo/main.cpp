@@ -21,8 +21,10 @@ namespace
 void Report(const CStdException& e)
 {
     const CStdException::CExInfo info(e);
+    ustring message = info.GetErrorMessage();
+    message.trim_right(std::vector<wchar_t>{L'\r', L'\n'}); // system texts end with a line break
     std::wprintf(L"  error %ls from %ls: %ls\n", info.GetErrorCodeStr().c_str(), info.GetSource().c_str(),
-                 info.GetErrorMessage().c_str());
+                 message.c_str());
     std::wprintf(L"    call %ls, file %ls, line %u\n", info.GetFunction().c_str(), info.GetFileName().c_str(),
                  info.GetLine());
 }

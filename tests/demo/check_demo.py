@@ -35,7 +35,7 @@ def main():
         fail("the out-of-range reply is not reported readably", out)
     # The refused configuration is a Win32 failure of the library's wrapper.
     expected = r"call WSAConnect, file Socket" if mode else r"call SetCommState, file CommPort"
-    if not re.search(r"error \d+ from Win32: .+\n(\n)?\s+" + expected + r", line \d+", out):
+    if not re.search(r"error \d+ from Win32: .+\n\s+" + expected + r", line \d+", out):
         fail("the Win32 failure is not reported with call and file", out)
 
     # The log file: its Windows path, mapped into the prefix's documents folder.
