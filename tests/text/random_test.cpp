@@ -47,7 +47,6 @@ TEST(UstringBadInputTest, RandomTextKeepsEveryInvariant)
             b = char(below(256));
         const ustring strict(bytes, CP_UTF8, MB_ERR_INVALID_CHARS); // accepted bytes convert back exactly
         ASSERT_TRUE(strict.empty() || bytes == ustring::WideCharToMultiByte(strict, CP_UTF8, 0));
-
         std::vector<ustring> pieces; // the pieces joined by the delimiter give the text back
         ustring::split(s, set.c_str(), pieces, true);
         ustring joined;
@@ -69,21 +68,18 @@ TEST(UstringBadInputTest, RandomTextKeepsEveryInvariant)
         removed.removeForbiddenSymbols(set.c_str());
         kept.removeForbiddenSymbols2(set.c_str());
         encoded.replaceForbiddenSymbols(set.c_str());
-        size_t encodedSize = 0;
-        for (wchar_t c : static_cast<const std::wstring&>(s))
-            encodedSize += !inSet(c) ? 1 : unsigned(c) < 0x100 ? 3 : unsigned(c) < 0x1000 ? 4 : 5;
         ASSERT_EQ(s.size(), removed.size() + kept.size());
         ASSERT_EQ(0, std::count_if(removed.begin(), removed.end(), inSet));
         ASSERT_EQ(kept.size(), size_t(std::count_if(kept.begin(), kept.end(), inSet)));
-        ASSERT_EQ(encodedSize, encoded.size());
-
-        size_t digits = 0; // Hex2Bin: true exactly for hex digits and blanks, one byte per pair of digits
+        size_t encodedSize = 0, digits = 0; // "%XX" has two to four digits; Hex2Bin reads digits and blanks
         bool valid = true;
-        for (wchar_t c : static_cast<const std::wstring&>(s))
+        for (wchar_t c : s)
         {
+            encodedSize += !inSet(c) ? 1 : unsigned(c) < 0x100 ? 3 : unsigned(c) < 0x1000 ? 4 : 5;
             digits += ::iswxdigit(c) ? 1 : 0;
             valid = valid && (::iswxdigit(c) || c == L' ' || c == L'\r' || c == L'\n' || c == L'\t');
         }
+        ASSERT_EQ(encodedSize, encoded.size());
         std::vector<unsigned char> bin{0x55};
         ASSERT_EQ(valid, ustring::Hex2Bin(s, bin));
         ASSERT_EQ(valid ? digits / 2 : 0u, bin.size());
