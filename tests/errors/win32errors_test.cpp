@@ -2,14 +2,13 @@
 // The fixture owns the file and its folder, so this executable runs serially: no other test sees them.
 #include <ostrand/errors/Exception.h>
 #include <ostrand/system/File.h>
-
 #include <gtest/gtest.h>
-
 #include <algorithm>
 #include <cstring>
 #include <cwchar>
 #include <random>
 #include <string>
+#include <tuple>
 
 using namespace ostrand;
 
@@ -78,9 +77,8 @@ protected:
     {
         CFile file(m_strFile.c_str(), GENERIC_WRITE, 0, NULL, CREATE_ALWAYS, FILE_ATTRIBUTE_NORMAL);
         unsigned __int64 written = 0;
-        if (!bytes.empty())
-            file.Write(bytes.data(), bytes.size(), written);
-        ASSERT_EQ(bytes.size(), written);
+        ASSERT_TRUE(bytes.empty() ||
+                    (file.Write(bytes.data(), bytes.size(), written) && written == bytes.size()));
     }
 
     // The message of `code`, or kFallback when the lookup found nothing and gave the fallback text.
@@ -102,18 +100,14 @@ TEST_F(Win32ErrorsFileTest, FileFormat)
     const std::wstring big(1 << 20, L'A'); // 2 MiB
     const std::wstring hides = L"536914894 no comma\n0x2000ABCD,joined\n0x2000ABCF,after\n";
     wchar_t* system = NULL; // the system's text comes before the file's, whatever Wine's text is
-    ASSERT_NE(0u, ::FormatMessageW(FORMAT_MESSAGE_ALLOCATE_BUFFER | FORMAT_MESSAGE_IGNORE_INSERTS |
-                                       FORMAT_MESSAGE_FROM_SYSTEM,
-                                   NULL, 2, MAKELANGID(LANG_NEUTRAL, SUBLANG_DEFAULT),
+    const DWORD flags =
+        FORMAT_MESSAGE_ALLOCATE_BUFFER | FORMAT_MESSAGE_IGNORE_INSERTS | FORMAT_MESSAGE_FROM_SYSTEM;
+    ASSERT_NE(0u, ::FormatMessageW(flags, NULL, 2, MAKELANGID(LANG_NEUTRAL, SUBLANG_DEFAULT),
                                    reinterpret_cast<wchar_t*>(&system), 0, NULL));
     const ustring systemText(system);
     ::LocalFree(system);
-    const struct
-    {
-        std::string file;
-        DWORD code;
-        ustring expected;
-    } rows[] = {
+    const std::tuple<std::string, DWORD, ustring> rows[] = {
+        // file, code, message
         {Utf16(L"0x2000ABCD,hex\r\n"), kA, L"hex"},
         {Utf16(L"  0X2000abce  ,a, b\n"), kB, L"a, b"}, // blanks around the key; the first comma splits
         {Utf16(L"536914893,decimal\n"), kA, L"decimal"},
@@ -138,11 +132,10 @@ TEST_F(Win32ErrorsFileTest, FileFormat)
         {Utf16(L"0x2000ABCD," + big + L"\n"), kA, big},
         {Utf16(L"0x2000ABCD," + big), kA, kFallback},
         {Utf16(L"2,from the file\n"), ERROR_FILE_NOT_FOUND, systemText}};
-    for (const auto& r : rows)
+    for (const auto& [file, code, expected] : rows)
     {
-        SCOPED_TRACE(testing::Message() << "row " << (&r - rows));
-        Write(r.file); // a fresh file for every row: the library must not keep an earlier one
-        EXPECT_EQ(r.expected, Message(r.code));
+        Write(file); // a fresh file for every row: the library must not keep an earlier one
+        EXPECT_EQ(expected, Message(code)) << file.size() << " bytes, code " << code;
     }
 }
 
@@ -184,9 +177,9 @@ TEST_F(Win32ErrorsFileTest, RandomFilesAlwaysEndWithAMessage)
         Write(bytes);
         for (DWORD code : {kA, kB, kC, DWORD(0xFFFFFFFF)})
         {
-            SCOPED_TRACE(testing::Message() << "seed " << seed << " code " << code);
             ustring expected;
-            ASSERT_EQ(ReferenceLookup(bytes, code, expected) ? expected : kFallback, Message(code));
+            ASSERT_EQ(ReferenceLookup(bytes, code, expected) ? expected : kFallback, Message(code))
+                << "seed " << seed << " code " << code;
             found += expected.empty() ? 0 : 1;
         }
     }
