@@ -1,4 +1,4 @@
-// Helpers of the system tests: a temporary folder per test and the capture of a CWinException.
+// Helpers of the system tests: the capture of a CWinException and a temporary folder per test.
 #pragma once
 
 #include <ostrand/errors/Exception.h>
@@ -26,7 +26,6 @@ template <class F> ostrand::CWinException CatchWin(F f)
     return ostrand::CWinException();
 }
 
-// Checks the payload of an exception: code, call name, source file and a real line.
 inline void ExpectPayload(const ostrand::CWinException& e, DWORD code, const wchar_t* call,
                           const wchar_t* file)
 {
@@ -36,34 +35,7 @@ inline void ExpectPayload(const ostrand::CWinException& e, DWORD code, const wch
     EXPECT_GT(e.GetLine(), 0u);
 }
 
-// Deletes a folder with everything in it; paths go through the \\?\ form so long ones work too.
-inline void DeleteTree(const std::wstring& folder)
-{
-    const std::wstring base = folder.compare(0, 4, L"\\\\?\\") == 0 ? folder : L"\\\\?\\" + folder;
-    WIN32_FIND_DATAW data;
-    HANDLE search = ::FindFirstFileW((base + L"\\*").c_str(), &data);
-    if (search != INVALID_HANDLE_VALUE)
-    {
-        do
-        {
-            const std::wstring name = data.cFileName;
-            if (name == L"." || name == L"..")
-                continue;
-            const std::wstring path = base + L"\\" + name;
-            if (data.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY)
-                DeleteTree(path);
-            else
-            {
-                ::SetFileAttributesW(path.c_str(), FILE_ATTRIBUTE_NORMAL);
-                ::DeleteFileW(path.c_str());
-            }
-        } while (::FindNextFileW(search, &data));
-        ::FindClose(search);
-    }
-    ::RemoveDirectoryW(base.c_str());
-}
-
-// A fresh, empty folder under the system's temporary folder, removed with its contents at the end.
+// A fresh folder under the system's temporary folder, removed with its contents at the end.
 class TempFolder
 {
 public:
@@ -72,38 +44,46 @@ public:
         static unsigned counter = 0;
         wchar_t temp[MAX_PATH + 1];
         const DWORD n = ::GetTempPathW(MAX_PATH + 1, temp);
-        if (n == 0 || n > MAX_PATH)
-            throw std::runtime_error("no temporary folder");
-        wchar_t name[64];
-        _snwprintf(name, 63, L"ostrand-test-%lu-%lu-%u", ::GetCurrentProcessId(), ::GetTickCount(),
-                   ++counter);
-        name[63] = 0;
-        m_path = std::wstring(temp) + name;
-        if (!::CreateDirectoryW(m_path.c_str(), NULL))
+        m_path = std::wstring(temp, n) + L"ostrand-test-" + std::to_wstring(::GetCurrentProcessId()) + L"-" +
+                 std::to_wstring(::GetTickCount()) + L"-" + std::to_wstring(++counter);
+        if (n == 0 || n > MAX_PATH || !::CreateDirectoryW(m_path.c_str(), NULL))
             throw std::runtime_error("cannot create the temporary folder");
     }
-    ~TempFolder() { DeleteTree(m_path); }
+    ~TempFolder() { DeleteTree(L"\\\\?\\" + m_path); }
 
-    TempFolder(const TempFolder&) = delete;
-    TempFolder& operator=(const TempFolder&) = delete;
-
-    // The folder without a trailing backslash.
     const std::wstring& Path() const { return m_path; }
     std::wstring operator/(const std::wstring& name) const { return m_path + L"\\" + name; }
 
+    // Creates a chain of folders below this one, longer than `length` in all; returns its path.
+    std::wstring DeepFolder(size_t length) const
+    {
+        std::wstring folder = m_path;
+        while (folder.size() <= length)
+            if (!::CreateDirectoryW((L"\\\\?\\" + (folder += L"\\" + std::wstring(50, L'd'))).c_str(), NULL))
+                throw std::runtime_error("cannot create a deep folder");
+        return folder;
+    }
+
 private:
+    static void DeleteTree(const std::wstring& folder) // in the \\?\ form, so beyond 260 too
+    {
+        WIN32_FIND_DATAW data;
+        HANDLE search = ::FindFirstFileW((folder + L"\\*").c_str(), &data);
+        for (BOOL more = search != INVALID_HANDLE_VALUE; more; more = ::FindNextFileW(search, &data))
+        {
+            const std::wstring name = data.cFileName, path = folder + L"\\" + name;
+            if (name == L"." || name == L"..")
+                continue;
+            if (data.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY)
+                DeleteTree(path);
+            else
+                ::DeleteFileW(path.c_str());
+        }
+        ::FindClose(search);
+        ::RemoveDirectoryW(folder.c_str());
+    }
+
     std::wstring m_path;
 };
-
-// Writes `bytes` to a new file (replacing an old one).
-inline void WriteWholeFile(const std::wstring& path, const std::string& bytes)
-{
-    HANDLE h = ::CreateFileW(path.c_str(), GENERIC_WRITE, 0, NULL, CREATE_ALWAYS, 0, NULL);
-    ASSERT_NE(INVALID_HANDLE_VALUE, h);
-    DWORD written = 0;
-    EXPECT_TRUE(::WriteFile(h, bytes.data(), static_cast<DWORD>(bytes.size()), &written, NULL));
-    EXPECT_EQ(bytes.size(), written);
-    ::CloseHandle(h);
-}
 
 } // namespace systest

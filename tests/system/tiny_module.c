@@ -1,4 +1,4 @@
-/* A module with nothing in it, loaded from a long path by the module-name tests. */
+/* Nothing but an export: the module-name test loads a copy of it from a path beyond 260 characters. */
 __declspec(dllexport) int ostrand_tiny_module_answer(void)
 {
     return 42;
