@@ -92,12 +92,9 @@ void CCommPort::TransmitCommChar(char c)
 
 bool CCommPort::WaitCommEvent(DWORD& mask, OVERLAPPED* overlapped)
 {
-    if (::WaitCommEvent(GetHandle(), &mask, overlapped))
-        return true;
-    const DWORD error = ::GetLastError();
-    if (error == ERROR_IO_PENDING)
-        return false;
-    OSTRAND_THROW_WIN(L"WaitCommEvent", error);
+    const BOOL done = ::WaitCommEvent(GetHandle(), &mask, overlapped);
+    const DWORD error = done ? 0 : ::GetLastError();
+    OSTRAND_RETURN_DONE_OR_NOT_YET(done, error, ERROR_IO_PENDING, L"WaitCommEvent");
 }
 
 } // namespace ostrand

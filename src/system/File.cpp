@@ -77,11 +77,7 @@ bool CFile::Read(void* buffer, unsigned __int64 count, unsigned __int64& transfe
     const BOOL done = ::ReadFile(GetHandle(), buffer, TransferCount(count), &n, overlapped);
     const DWORD error = done ? 0 : ::GetLastError();
     transferred = n;
-    if (done)
-        return true;
-    if (error == ERROR_IO_PENDING)
-        return false;
-    OSTRAND_THROW_WIN(L"ReadFile", error);
+    OSTRAND_RETURN_DONE_OR_NOT_YET(done, error, ERROR_IO_PENDING, L"ReadFile");
 }
 
 bool CFile::Write(const void* buffer, unsigned __int64 count, unsigned __int64& transferred,
@@ -91,11 +87,7 @@ bool CFile::Write(const void* buffer, unsigned __int64 count, unsigned __int64& 
     const BOOL done = ::WriteFile(GetHandle(), buffer, TransferCount(count), &n, overlapped);
     const DWORD error = done ? 0 : ::GetLastError();
     transferred = n;
-    if (done)
-        return true;
-    if (error == ERROR_IO_PENDING)
-        return false;
-    OSTRAND_THROW_WIN(L"WriteFile", error);
+    OSTRAND_RETURN_DONE_OR_NOT_YET(done, error, ERROR_IO_PENDING, L"WriteFile");
 }
 
 void CFile::Flush()
@@ -166,11 +158,7 @@ bool CFile::GetOverlappedResult(OVERLAPPED* overlapped, unsigned __int64& transf
     const BOOL done = ::GetOverlappedResult(GetHandle(), overlapped, &n, wait);
     const DWORD error = done ? 0 : ::GetLastError();
     transferred = n;
-    if (done)
-        return true;
-    if (error == ERROR_IO_INCOMPLETE)
-        return false;
-    OSTRAND_THROW_WIN(L"GetOverlappedResult", error);
+    OSTRAND_RETURN_DONE_OR_NOT_YET(done, error, ERROR_IO_INCOMPLETE, L"GetOverlappedResult");
 }
 
 // Testers ----------------------------------------------------------------------------------------------

@@ -53,8 +53,8 @@ void CWSASocket::Close()
 
     const BOOL dontLinger = TRUE;
     const bool optionSet =
-        ::setsockopt(s, SOL_SOCKET, SO_DONTLINGER, reinterpret_cast<const char*>(&dontLinger), sizeof dontLinger) !=
-        SOCKET_ERROR;
+        ::setsockopt(s, SOL_SOCKET, SO_DONTLINGER, reinterpret_cast<const char*>(&dontLinger),
+                     sizeof dontLinger) != SOCKET_ERROR;
     const int optionError = optionSet ? 0 : ::WSAGetLastError();
     const bool closed = ::closesocket(s) != SOCKET_ERROR;
     const int closeError = closed ? 0 : ::WSAGetLastError();
@@ -75,8 +75,8 @@ int Length32(unsigned __int64 length)
 
 void CWSASocket::BindLL(const void* address, unsigned __int64 length)
 {
-    OSTRAND_CHECK_WSA(::bind(m_Socket, static_cast<const sockaddr*>(address), Length32(length)) == SOCKET_ERROR,
-                      L"bind");
+    OSTRAND_CHECK_WSA(
+        ::bind(m_Socket, static_cast<const sockaddr*>(address), Length32(length)) == SOCKET_ERROR, L"bind");
 }
 
 void CWSASocket::Listen(int backlog)
@@ -88,8 +88,8 @@ SOCKET CWSASocket::AcceptLL(void* address, unsigned __int64 length, LPCONDITIONP
                             DWORD_PTR callbackData)
 {
     int len = Length32(length);
-    const SOCKET s =
-        ::WSAAccept(m_Socket, static_cast<sockaddr*>(address), address == NULL ? NULL : &len, condition, callbackData);
+    const SOCKET s = ::WSAAccept(m_Socket, static_cast<sockaddr*>(address), address == NULL ? NULL : &len,
+                                 condition, callbackData);
     if (s != INVALID_SOCKET)
         return s;
     const int error = ::WSAGetLastError();
@@ -98,11 +98,11 @@ SOCKET CWSASocket::AcceptLL(void* address, unsigned __int64 length, LPCONDITIONP
     OSTRAND_THROW_WIN(L"WSAAccept", error);
 }
 
-void CWSASocket::ConnectLL(const void* address, unsigned __int64 length, WSABUF* callerData, WSABUF* calleeData,
-                           QOS* socketQos, QOS* groupQos)
+void CWSASocket::ConnectLL(const void* address, unsigned __int64 length, WSABUF* callerData,
+                           WSABUF* calleeData, QOS* socketQos, QOS* groupQos)
 {
-    OSTRAND_CHECK_WSA(::WSAConnect(m_Socket, static_cast<const sockaddr*>(address), Length32(length), callerData,
-                                   calleeData, socketQos, groupQos) == SOCKET_ERROR,
+    OSTRAND_CHECK_WSA(::WSAConnect(m_Socket, static_cast<const sockaddr*>(address), Length32(length),
+                                   callerData, calleeData, socketQos, groupQos) == SOCKET_ERROR,
                       L"WSAConnect");
 }
 
@@ -122,12 +122,8 @@ bool CWSASocket::Send(const void* buffer, unsigned __int64 size, unsigned __int6
     DWORD n = 0;
     const int r = ::WSASend(m_Socket, &b, 1, &n, flags, overlapped, NULL);
     sent = n;
-    if (r != SOCKET_ERROR)
-        return true;
-    const int error = ::WSAGetLastError();
-    if (error == WSA_IO_PENDING)
-        return false;
-    OSTRAND_THROW_WIN(L"WSASend", error);
+    const int error = r == SOCKET_ERROR ? ::WSAGetLastError() : 0;
+    OSTRAND_RETURN_DONE_OR_NOT_YET(r != SOCKET_ERROR, error, WSA_IO_PENDING, L"WSASend");
 }
 
 bool CWSASocket::Recv(void* buffer, unsigned __int64 size, unsigned __int64& received, DWORD& flags,
@@ -139,12 +135,8 @@ bool CWSASocket::Recv(void* buffer, unsigned __int64 size, unsigned __int64& rec
     DWORD n = 0;
     const int r = ::WSARecv(m_Socket, &b, 1, &n, &flags, overlapped, NULL);
     received = n;
-    if (r != SOCKET_ERROR)
-        return true;
-    const int error = ::WSAGetLastError();
-    if (error == WSA_IO_PENDING)
-        return false;
-    OSTRAND_THROW_WIN(L"WSARecv", error);
+    const int error = r == SOCKET_ERROR ? ::WSAGetLastError() : 0;
+    OSTRAND_RETURN_DONE_OR_NOT_YET(r != SOCKET_ERROR, error, WSA_IO_PENDING, L"WSARecv");
 }
 
 bool CWSASocket::GetOverlappedResult(OVERLAPPED* overlapped, unsigned __int64& transferred, BOOL wait,
@@ -153,12 +145,8 @@ bool CWSASocket::GetOverlappedResult(OVERLAPPED* overlapped, unsigned __int64& t
     DWORD n = 0;
     const BOOL done = ::WSAGetOverlappedResult(m_Socket, overlapped, &n, wait, &flags);
     transferred = n;
-    if (done)
-        return true;
-    const int error = ::WSAGetLastError();
-    if (error == WSA_IO_INCOMPLETE)
-        return false;
-    OSTRAND_THROW_WIN(L"WSAGetOverlappedResult", error);
+    const int error = done ? 0 : ::WSAGetLastError();
+    OSTRAND_RETURN_DONE_OR_NOT_YET(done, error, WSA_IO_INCOMPLETE, L"WSAGetOverlappedResult");
 }
 
 void CWSASocket::EventSelect(WSAEVENT event, long networkEvents)
@@ -180,8 +168,8 @@ void CWSASocket::GetSockOptLL(int level, int name, void* value, unsigned __int64
 
 void CWSASocket::SetSockOptLL(int level, int name, const void* value, unsigned __int64 length)
 {
-    OSTRAND_CHECK_WSA(::setsockopt(m_Socket, level, name, static_cast<const char*>(value), Length32(length)) ==
-                          SOCKET_ERROR,
+    OSTRAND_CHECK_WSA(::setsockopt(m_Socket, level, name, static_cast<const char*>(value),
+                                   Length32(length)) == SOCKET_ERROR,
                       L"setsockopt");
 }
 
@@ -235,10 +223,11 @@ bool CWSASocket::GetAddressString(const sockaddr* address, unsigned __int64 leng
             return false;
         unsigned __int64 bth;
         std::memcpy(&bth, raw + 2, sizeof bth);
-        const unsigned b[6] = {unsigned(bth >> 40) & 0xFF, unsigned(bth >> 32) & 0xFF, unsigned(bth >> 24) & 0xFF,
-                               unsigned(bth >> 16) & 0xFF, unsigned(bth >> 8) & 0xFF,  unsigned(bth) & 0xFF};
-        text.sprintf(fileNameForm ? L"%02X_%02X_%02X_%02X_%02X_%02X" : L"%02X:%02X:%02X:%02X:%02X:%02X", b[0], b[1],
-                     b[2], b[3], b[4], b[5]);
+        const unsigned b[6] = {unsigned(bth >> 40) & 0xFF, unsigned(bth >> 32) & 0xFF,
+                               unsigned(bth >> 24) & 0xFF, unsigned(bth >> 16) & 0xFF,
+                               unsigned(bth >> 8) & 0xFF,  unsigned(bth) & 0xFF};
+        text.sprintf(fileNameForm ? L"%02X_%02X_%02X_%02X_%02X_%02X" : L"%02X:%02X:%02X:%02X:%02X:%02X", b[0],
+                     b[1], b[2], b[3], b[4], b[5]);
         return true;
     }
     return false;
