@@ -4,6 +4,8 @@
 #include <ostrand/system/Object.h>
 #include <ostrand/system/Socket.h>
 
+#include "../support/ChildProcess.h"
+
 #include <gtest/gtest.h>
 
 #include <cstring>
@@ -79,29 +81,17 @@ protected:
     {
         wchar_t self[MAX_PATH];
         ::GetModuleFileNameW(NULL, self, MAX_PATH);
-        ustring exe(self);
-        exe = ustring(exe.substr(0, exe.find_last_of(L'\\') + 1)) + L"socket_peer.exe";
-        ustring command;
-        command.sprintf(L"\"%s\" %u %d %S", exe.c_str(), port, delayMs, text);
-        STARTUPINFOW si = {};
-        si.cb = sizeof si;
-        ASSERT_TRUE(::CreateProcessW(exe.c_str(), &command[0], NULL, NULL, FALSE, 0, NULL, NULL, &si, &peer));
-        ::CloseHandle(peer.hThread);
+        std::wstring exe(self);
+        exe = exe.substr(0, exe.find_last_of(L'\\') + 1) + L"socket_peer.exe";
+        ASSERT_TRUE(peer.Start({exe, std::to_wstring(port), std::to_wstring(delayMs),
+                                std::wstring(text, text + std::strlen(text))}));
     }
 
-    void TearDown() override
-    {
-        if (peer.hProcess != NULL)
-        {
-            EXPECT_EQ(WAIT_OBJECT_0, ::WaitForSingleObject(peer.hProcess, 10000));
-            ::TerminateProcess(peer.hProcess, 1);
-            ::CloseHandle(peer.hProcess);
-        }
-    }
+    void TearDown() override { EXPECT_TRUE(peer.Wait(10000)) << "the peer did not end"; }
 
     CWSASocket listener;
     unsigned short port = 0;
-    PROCESS_INFORMATION peer = {};
+    testsupport::ChildProcess peer;
 };
 
 int CALLBACK Reject(LPWSABUF, LPWSABUF, LPQOS, LPQOS, LPWSABUF, LPWSABUF, GROUP*, DWORD_PTR)
