@@ -33,7 +33,8 @@ struct Registrar
 // Seconds from the performance counter.
 inline double Now()
 {
-    static const double frequency = [] {
+    static const double frequency = []
+    {
         LARGE_INTEGER f;
         ::QueryPerformanceFrequency(&f);
         return static_cast<double>(f.QuadPart);
@@ -72,7 +73,7 @@ template <class T> inline void Keep(const T& value)
 
 #define BENCH_CAT2(a, b) a##b
 #define BENCH_CAT(a, b) BENCH_CAT2(a, b)
-#define BENCHMARK(name)                                                                                     \
-    static void BENCH_CAT(bench_, __LINE__)();                                                              \
-    static ::bench::Registrar BENCH_CAT(bench_registrar_, __LINE__)(name, BENCH_CAT(bench_, __LINE__));     \
+#define BENCHMARK(name)                                                                                      \
+    static void BENCH_CAT(bench_, __LINE__)();                                                               \
+    static ::bench::Registrar BENCH_CAT(bench_registrar_, __LINE__)(name, BENCH_CAT(bench_, __LINE__));      \
     static void BENCH_CAT(bench_, __LINE__)()

@@ -61,31 +61,36 @@ BENCHMARK("socket/round trip")
         double wrapped = 1e300, raw = 1e300;
         for (int round = 0; round < 5; ++round)
         {
-            raw = std::min(raw, bench::BestOf(1, [&] {
-                for (int i = 0; i < trips; ++i)
-                {
-                    ::send(client, out, sizeof out, 0);
-                    ReceiveAll(client, in, sizeof in);
-                }
-            }));
-            wrapped = std::min(wrapped, bench::BestOf(1, [&] {
-                for (int i = 0; i < trips; ++i)
-                {
-                    unsigned __int64 n = 0;
-                    client.Send(out, sizeof out, n);
-                    for (unsigned __int64 got = 0; got < sizeof in; got += n)
-                    {
-                        DWORD flags = 0;
-                        client.Recv(in + got, sizeof in - got, n, flags);
-                        if (n == 0)
-                            break;
-                    }
-                }
-            }));
+            raw = std::min(raw, bench::BestOf(1,
+                                              [&]
+                                              {
+                                                  for (int i = 0; i < trips; ++i)
+                                                  {
+                                                      ::send(client, out, sizeof out, 0);
+                                                      ReceiveAll(client, in, sizeof in);
+                                                  }
+                                              }));
+            wrapped = std::min(wrapped,
+                               bench::BestOf(1,
+                                             [&]
+                                             {
+                                                 for (int i = 0; i < trips; ++i)
+                                                 {
+                                                     unsigned __int64 n = 0;
+                                                     client.Send(out, sizeof out, n);
+                                                     for (unsigned __int64 got = 0; got < sizeof in; got += n)
+                                                     {
+                                                         DWORD flags = 0;
+                                                         client.Recv(in + got, sizeof in - got, n, flags);
+                                                         if (n == 0)
+                                                             break;
+                                                     }
+                                                 }
+                                             }));
         }
         bench::Keep(in);
-        std::printf("%d round trips of 64 bytes, best of 5 rounds: %.1f us per trip through CWSASocket\n", trips,
-                    wrapped / trips * 1e6);
+        std::printf("%d round trips of 64 bytes, best of 5 rounds: %.1f us per trip through CWSASocket\n",
+                    trips, wrapped / trips * 1e6);
         bench::Report("CWSASocket Send/Recv round trips", wrapped, raw, "raw send/recv");
         client.Shutdown(SD_BOTH);
         echo.join();

@@ -89,7 +89,10 @@ public:
         m_Port.SetCommMask(EV_RXCHAR);
     }
 
-    unsigned __int64 Channel() const override { return reinterpret_cast<unsigned __int64>(m_Port.GetHandle()); }
+    unsigned __int64 Channel() const override
+    {
+        return reinterpret_cast<unsigned __int64>(m_Port.GetHandle());
+    }
     ustring Name() const override { return m_strPort; }
     ustring LogPrefix() const override
     {
@@ -191,7 +194,8 @@ private:
 class TcpLink : public Link
 {
 public:
-    TcpLink(const std::string& host, unsigned short port) : m_strName(Widen(host + ":" + std::to_string(port)))
+    TcpLink(const std::string& host, unsigned short port)
+        : m_strName(Widen(host + ":" + std::to_string(port)))
     {
         m_Socket.Create(AF_INET, SOCK_STREAM, IPPROTO_TCP);
         m_Address = Address(host, port);
@@ -214,7 +218,8 @@ public:
     ustring LogPrefix() const override
     {
         ustring prefix;
-        m_Socket.GetAddressString(reinterpret_cast<const sockaddr*>(&m_Address), sizeof m_Address, true, prefix);
+        m_Socket.GetAddressString(reinterpret_cast<const sockaddr*>(&m_Address), sizeof m_Address, true,
+                                  prefix);
         return prefix;
     }
 
@@ -276,7 +281,8 @@ private:
         a.sin_family = AF_INET;
         a.sin_port = ::htons(port);
         if (::inet_pton(AF_INET, host.c_str(), &a.sin_addr) != 1)
-            throw CCommException(__LINE__, L"demo", L"inet_pton", L"not an IPv4 address", Widen(host).c_str());
+            throw CCommException(__LINE__, L"demo", L"inet_pton", L"not an IPv4 address",
+                                 Widen(host).c_str());
         return a;
     }
 
@@ -378,7 +384,8 @@ int Run(const Options& options)
         std::wprintf(L"  (no log file could be created)\n");
     logs.LogText(link->Channel(), true, L"Demo session on %s", link->Name().c_str());
 
-    const char* const commands[] = {"*IDN?", "CONF:RATE 10", "MEAS?", "MEAS?", "MEAS?", "FETCH?", "CONF:RATE 500"};
+    const char* const commands[] = {"*IDN?", "CONF:RATE 10", "MEAS?",        "MEAS?",
+                                    "MEAS?", "FETCH?",       "CONF:RATE 500"};
     for (const char* command : commands)
     {
         std::wprintf(L"> %hs\n", command);

@@ -44,7 +44,8 @@ HANDLE CHandle::Detach()
 
 // CEvent -----------------------------------------------------------------------------------------------
 
-CEvent::CEvent(SECURITY_ATTRIBUTES* sa, BOOL manualReset, BOOL initialState, const wchar_t* name) : CHandle(NULL)
+CEvent::CEvent(SECURITY_ATTRIBUTES* sa, BOOL manualReset, BOOL initialState, const wchar_t* name)
+    : CHandle(NULL)
 {
     HANDLE h = ::CreateEventW(sa, manualReset, initialState, name);
     if (h == NULL)

@@ -125,7 +125,8 @@ public:
     // Splits at every occurrence of `delimiter`; empty pieces are kept, and a trailing empty piece only
     // when `keepLastEmpty`. An empty `s` gives an empty container. An empty or null delimiter gives
     // the whole of `s` as one piece.
-    template <class C> static void split(const ustring& s, const wchar_t* delimiter, C& out, bool keepLastEmpty);
+    template <class C>
+    static void split(const ustring& s, const wchar_t* delimiter, C& out, bool keepLastEmpty);
     template <class C> static void split(const ustring& s, wchar_t delimiter, C& out, bool keepLastEmpty);
     // Splits a zero-separated multi-string ("a\0b\0\0").
     template <class C> static void split(const ustring& s, C& out);
@@ -159,8 +160,8 @@ public:
     // Pairs of hex digits; blanks (space, CR, LF, tab) are skipped anywhere, an odd last digit is
     // dropped, any other character clears `bytes` and returns false.
     static bool Hex2Bin(const ustring& hex, std::vector<unsigned char>& bytes);
-    static bool GUID2String(const GUID& guid, ustring& text);    // braced upper-case form
-    static bool String2GUID(const wchar_t* text, GUID& guid);    // what CLSIDFromString accepts
+    static bool GUID2String(const GUID& guid, ustring& text); // braced upper-case form
+    static bool String2GUID(const wchar_t* text, GUID& guid); // what CLSIDFromString accepts
 };
 
 // Concatenation. The mixed forms make `u + L"text"` and `L"text" + u` unambiguous ustrings.
