@@ -1,96 +1,90 @@
 // Shared by the thread tests: a window that counts its messages, and a check of CWinException.
 #pragma once
 
-#include <ostrand/system/Thread.h>
 #include <ostrand/errors/Exception.h>
+#include <ostrand/system/APC.h>
+#include <ostrand/system/Misc.h>
+#include <ostrand/system/Thread.h>
 
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <cstring>
 #include <functional>
+#include <stdexcept>
+#include <thread>
+#include <tuple>
 
 namespace threadtests
 {
 
-// Expects `f` to throw CWinException with this call name, code and source file.
-inline void ExpectWinError(const std::function<void()>& f, const wchar_t* call, DWORD code,
-                           const wchar_t* file)
+// What `f` throws: "function code file" of a CWinException, "runtime_error what" of a runtime_error.
+inline std::wstring Thrown(const std::function<void()>& f)
 {
     try
     {
         f();
-        ADD_FAILURE() << "no exception from " << ostrand::ustring(call).c_str();
     }
     catch (const ostrand::CWinException& e)
     {
-        EXPECT_EQ(ostrand::ustring(call), e.GetFunction());
-        EXPECT_EQ(code, e.GetErrorCode()) << ostrand::ustring(call).c_str();
-        EXPECT_EQ(ostrand::ustring(file), e.GetFileName());
+        return std::wstring(e.GetFunction()) + L" " + std::to_wstring(e.GetErrorCode()) + L" " +
+               std::wstring(e.GetFileName());
     }
+    catch (const std::runtime_error& e)
+    {
+        return L"runtime_error " + std::wstring(e.what(), e.what() + std::strlen(e.what()));
+    }
+    return L"nothing";
 }
 
 // A visible popup that counts the messages its procedure receives, read from any thread; paints validate.
-class RecordingWindow
+struct RecordingWindow
 {
-public:
     RecordingWindow()
     {
-        WNDCLASSW wc = {};
-        wc.lpfnWndProc = &Proc;
-        wc.hInstance = ::GetModuleHandleW(NULL);
-        wc.lpszClassName = L"OstrandRecordingWindow";
+        WNDCLASSW wc = {0,    &Proc, 0,    0,    ::GetModuleHandleW(NULL),
+                        NULL, NULL,  NULL, NULL, L"OstrandRecording"};
         ::RegisterClassW(&wc); // fails harmlessly once registered
-        m_hWnd = ::CreateWindowExW(0, wc.lpszClassName, L"recording", WS_POPUP, 10, 10, 200, 150, NULL, NULL,
-                                   wc.hInstance, NULL);
+        hwnd = ::CreateWindowExW(0, wc.lpszClassName, L"recording", WS_POPUP, 10, 10, 200, 150, NULL, NULL,
+                                 wc.hInstance, NULL);
         // Unactivated, Wine leaves it unmanaged: destroying it does not wait for a window manager.
-        ::ShowWindow(m_hWnd, SW_SHOWNOACTIVATE);
-        // Creation and the first paint are not what the tests count.
+        ::ShowWindow(hwnd, SW_SHOWNOACTIVATE);
         for (ULONGLONG end = ::GetTickCount64() + 200; ::GetTickCount64() < end; ::Sleep(5))
-            Pump();
-        ::SetWindowLongPtrW(m_hWnd, GWLP_USERDATA, reinterpret_cast<LONG_PTR>(this));
+            Pump(); // creation and the first paint are not counted
+        ::SetWindowLongPtrW(hwnd, GWLP_USERDATA, reinterpret_cast<LONG_PTR>(this));
     }
-    ~RecordingWindow()
+    ~RecordingWindow() { ::DestroyWindow(hwnd), Pump(); }
+    bool WaitFor(UINT message) const // at most 5 s
     {
-        ::DestroyWindow(m_hWnd);
-        Pump();
+        for (int i = 0; i < 5000 && count[message] == 0; ++i)
+            ::Sleep(1);
+        return count[message] > 0;
     }
-
-    HWND Handle() const { return m_hWnd; }
-    int Count(UINT message) const { return m_aCount[message].load(); }
-    // Polls until the window has received `message`; false after `timeoutMs`.
-    bool WaitFor(UINT message, DWORD timeoutMs) const
+    // The repaint is done, the queued WM_QUIT kept with its code, nothing of first..last held back.
+    void ExpectPaintedQuitKeptAndDropped(bool painted, WPARAM quit, UINT first, UINT last) const
     {
-        for (const ULONGLONG end = ::GetTickCount64() + timeoutMs; Count(message) == 0; ::Sleep(1))
-            if (::GetTickCount64() >= end)
-                return false;
-        return true;
+        EXPECT_EQ(painted, count[WM_PAINT] > 0);
+        EXPECT_EQ(painted, ::GetUpdateRect(hwnd, NULL, FALSE) == FALSE);
+        MSG msg; // the WM_QUIT first: a peek with any filter returns it
+        ASSERT_TRUE(::PeekMessageW(&msg, NULL, WM_QUIT, WM_QUIT, PM_REMOVE));
+        EXPECT_EQ(quit, msg.wParam);
+        EXPECT_FALSE(::PeekMessageW(&msg, hwnd, first, last, PM_NOREMOVE));
     }
-    bool HasQueued(UINT first, UINT last) const
-    {
-        MSG msg;
-        return ::PeekMessageW(&msg, m_hWnd, first, last, PM_NOREMOVE) != FALSE;
-    }
-
-private:
     static void Pump()
     {
-        MSG msg;
-        while (::PeekMessageW(&msg, NULL, 0, 0, PM_REMOVE))
+        for (MSG msg; ::PeekMessageW(&msg, NULL, 0, 0, PM_REMOVE);)
             ::DispatchMessageW(&msg);
     }
     static LRESULT CALLBACK Proc(HWND hwnd, UINT message, WPARAM wParam, LPARAM lParam)
     {
         auto* self = reinterpret_cast<RecordingWindow*>(::GetWindowLongPtrW(hwnd, GWLP_USERDATA));
-        if (self != NULL && message < kTracked)
-            ++self->m_aCount[message];
-        if (message != WM_PAINT)
-            return ::DefWindowProcW(hwnd, message, wParam, lParam);
-        return ::ValidateRect(hwnd, NULL) ? 0 : 1;
+        if (self != NULL && message < WM_USER + 16)
+            ++self->count[message];
+        return message == WM_PAINT ? !::ValidateRect(hwnd, NULL)
+                                   : ::DefWindowProcW(hwnd, message, wParam, lParam);
     }
-
-    static const UINT kTracked = WM_USER + 16;
-    HWND m_hWnd;
-    std::atomic<int> m_aCount[kTracked] = {};
+    HWND hwnd;
+    std::atomic<int> count[WM_USER + 16] = {};
 };
 
 } // namespace threadtests
