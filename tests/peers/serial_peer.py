@@ -1,19 +1,11 @@
 #!/usr/bin/env python3
-"""The far end of a serial line for the tests: links the slave of a raw pseudo-terminal as
-<prefix>/dosdevices/<port> and runs on the master the commands given with -e, separated by ';': send TEXT,
-expect TEXT, burst N (bytes i % 251), recv N (wait for N bytes), sleep SECONDS, echo (send back what
-arrives from then on), close (send the rest, hang up, end); texts take \\r and \\xHH. Then it records
-until WORKDIR/stop appears, SIGTERM comes or the time-out expires (a command under way gets 2 s more).
+"""The far end of a serial line for the tests: links the slave of a raw pseudo-terminal as <prefix>/dosdevices/<port>
+and runs on the master the ';'-separated commands given with -e: send TEXT, expect TEXT, burst N (bytes i % 251),
+recv N, sleep SECONDS, echo (send back all that arrives), close (send the rest, hang up); texts take \\r and \\xHH.
+Then it records until WORKDIR/stop appears, SIGTERM comes or the time-out expires (a command under way gets 2 s more).
 WORKDIR gets "status" ("READY", then "DONE ok" or "DONE fail: reason"), "received" and "peer.log"."""
 
-import argparse
-import codecs
-import os
-import select
-import shlex
-import signal
-import time
-import tty
+import argparse, codecs, os, select, shlex, signal, time, tty  # noqa: E401
 
 
 class Stop(Exception):
@@ -24,13 +16,11 @@ class Peer:
     def __init__(self, args):
         self.stop_file, self.deadline = os.path.join(args.dir, "stop"), time.monotonic() + args.timeout
         self.record = open(args.record or os.path.join(args.dir, "received"), "ab", buffering=0)
-        self.pending, self.outgoing = bytearray(), bytearray()
-        self.echo, self.busy, self.stopping = False, None, None
+        self.pending, self.outgoing, self.echo, self.busy, self.stopping = bytearray(), bytearray(), False, None, None
         self.master, self.slave = os.openpty()  # holding the slave keeps the line up while the port reopens
         tty.setraw(self.slave)
         os.set_blocking(self.master, False)
-        self.slave_name = os.ttyname(self.slave)
-        self.link = os.path.join(args.prefix, "dosdevices", args.port.lower())
+        self.slave_name, self.link = os.ttyname(self.slave), os.path.join(args.prefix, "dosdevices", args.port.lower())
         os.symlink(self.slave_name, "%s.%d" % (self.link, os.getpid()))
         os.replace("%s.%d" % (self.link, os.getpid()), self.link)
 
@@ -58,10 +48,6 @@ class Peer:
         (self.outgoing if self.echo else self.pending).extend(data)
         return data
 
-    def take(self, count):
-        del self.pending[:count]
-        return True
-
     def run(self, commands):
         for name, *args in commands:
             self.busy = " ".join([name] + args)
@@ -71,9 +57,11 @@ class Peer:
             elif name == "burst":
                 self.outgoing += (bytes(range(251)) * (int(text) // 251 + 1))[: int(text)]
             elif name == "expect":
-                self.until(lambda: text in self.pending and self.take(self.pending.index(text) + len(text)))
+                self.until(lambda: text in self.pending)
+                del self.pending[: self.pending.index(text) + len(text)]
             elif name == "recv":
-                self.until(lambda: len(self.pending) >= int(text) and self.take(int(text)))
+                self.until(lambda: len(self.pending) >= int(text))
+                del self.pending[: int(text)]
             elif name == "sleep":
                 self.until(lambda end=time.monotonic() + float(text): time.monotonic() >= end)
             elif name == "echo":
@@ -88,8 +76,8 @@ class Peer:
 
 def main():
     parser = argparse.ArgumentParser(description=__doc__, formatter_class=argparse.RawTextHelpFormatter)
-    parser.add_argument("--port", required=True)
-    parser.add_argument("--dir", required=True)
+    for name in ("--port", "--dir"):
+        parser.add_argument(name, required=True)
     parser.add_argument("--prefix", default=os.environ.get("WINEPREFIX") or os.path.expanduser("~/.wine"))
     parser.add_argument("--record")
     parser.add_argument("-e", dest="commands", action="append", default=[])
@@ -97,16 +85,14 @@ def main():
     args = parser.parse_args()
     # Whoever started the peer may wait for the end of its output: keep that output in the work folder.
     log = os.open(os.path.join(args.dir, "peer.log"), os.O_WRONLY | os.O_CREAT | os.O_APPEND, 0o644)
-    os.dup2(log, 1)
-    os.dup2(log, 2)
-    commands = [shlex.split(part) for part in ";".join(args.commands).split(";") if part.strip()]
+    os.dup2(log, 1), os.dup2(log, 2)
     peer = Peer(args)
     signal.signal(signal.SIGTERM, lambda number, frame: setattr(peer, "stopping", time.monotonic()))
     status = open(os.path.join(args.dir, "status"), "a", buffering=1)
     status.write("READY %s\n" % peer.slave_name)
-    failure = None
     try:
-        peer.run(commands)
+        failure = None
+        peer.run([shlex.split(part) for part in ";".join(args.commands).split(";") if part.strip()])
     except Stop as stop:
         failure = stop.args[0]
         while select.select([peer.master], [], [], 0.05)[0] and peer.receive():
@@ -114,8 +100,7 @@ def main():
     finally:
         if os.path.islink(peer.link) and os.readlink(peer.link) == peer.slave_name:  # not a later peer's
             os.unlink(peer.link)
-        os.close(peer.master)
-        os.close(peer.slave)
+        os.close(peer.master), os.close(peer.slave)
     status.write("DONE %s\n" % ("fail: " + failure if failure else "ok"))
     return 1 if failure else 0
 

@@ -5,27 +5,19 @@
 #include <tuple>
 
 using namespace ostrand;
+using S = const wchar_t*;
 
-static std::string Show(const wchar_t* p)
-{
-    return p == NULL ? "(null) " : "[" + std::string(p, p + wcslen(p)) + "] ";
-}
+// clang-format off
+static std::string Show(S p) { return p == NULL ? "(null) " : "[" + std::string(p, p + wcslen(p)) + "] "; }
 
 TEST(CFilePathTest, MakePath)
 {
-    using S = const wchar_t*;
     const std::tuple<S, S, S, S, S> rows[] = {
-        {L"C:", L"data/logs\\", L"today", L"txt", L"C:\\data\\logs\\today.txt"},
-        {NULL, NULL, L"a", L".b", L"a.b"},
-        {NULL, NULL, L"a", L"", L"a"},
-        {NULL, NULL, NULL, NULL, L""},
-        {L"", L"", L"", L"", L""},
-        {L"C:", NULL, NULL, NULL, L"C:"},
-        {NULL, L"a.b/c.d/", L"x.y", L"z", L"a.b\\c.d\\x.y.z"},
-        {NULL, L"a\\\\\\b", L"c", NULL, L"a\\b\\c"},
+        {L"C:", L"data/logs\\", L"today", L"txt", L"C:\\data\\logs\\today.txt"}, {NULL, NULL, L"a", L".b", L"a.b"},
+        {NULL, NULL, L"a", L"", L"a"}, {NULL, NULL, NULL, NULL, L""}, {L"", L"", L"", L"", L""}, {L"C:", NULL, NULL, NULL, L"C:"},
+        {NULL, L"a.b/c.d/", L"x.y", L"z", L"a.b\\c.d\\x.y.z"}, {NULL, L"a\\\\\\b", L"c", NULL, L"a\\b\\c"},
         // Every run of backslashes becomes one, so a network share loses its leading pair.
-        {NULL, L"\\\\server\\share", L"f", L"txt", L"\\server\\share\\f.txt"},
-        {NULL, L"//server/share/", L"f", NULL, L"\\server\\share\\f"},
+        {NULL, L"\\\\server\\share", L"f", L"txt", L"\\server\\share\\f.txt"}, {NULL, L"//server/share/", L"f", NULL, L"\\server\\share\\f"},
     };
     for (const auto& [drive, dir, fname, ext, expected] : rows)
     {
@@ -37,40 +29,25 @@ TEST(CFilePathTest, MakePath)
 
 TEST(CFilePathTest, SplitPath)
 {
-    using S = const wchar_t*;
     const std::tuple<S, S, S, S, S> rows[] = {
-        {L"C:\\data\\logs\\today.txt", L"C:", L"\\data\\logs\\", L"today", L".txt"},
-        {L"archive.tar.gz", L"", L"", L"archive.tar", L".gz"},
-        {L"C:\\data.d\\file", L"C:", L"\\data.d\\", L"file", L""},
-        {L"C:", L"C:", L"", L"", L""},
-        {L"C:file.txt", L"C:", L"", L"file", L".txt"},
-        {L"\\\\server\\share\\f.txt", L"", L"\\\\server\\share\\", L"f", L".txt"},
-        {L"//server/share/", L"", L"\\\\server\\share\\", L"", L""},
-        {L".hidden", L"", L"", L"", L".hidden"},
-        {L"", L"", L"", L"", L""},
-        {NULL, L"", L"", L"", L""},
+        {L"C:\\data\\logs\\today.txt", L"C:", L"\\data\\logs\\", L"today", L".txt"}, {L"archive.tar.gz", L"", L"", L"archive.tar", L".gz"},
+        {L"C:\\data.d\\file", L"C:", L"\\data.d\\", L"file", L""}, {L"C:", L"C:", L"", L"", L""}, {L"C:file.txt", L"C:", L"", L"file", L".txt"},
+        {L"\\\\server\\share\\f.txt", L"", L"\\\\server\\share\\", L"f", L".txt"}, {L"//server/share/", L"", L"\\\\server\\share\\", L"", L""},
+        {L".hidden", L"", L"", L"", L".hidden"}, {L"", L"", L"", L"", L""}, {NULL, L"", L"", L"", L""},
     };
     for (const auto& [path, drive, dir, fname, ext] : rows)
     {
-        ustring pieces[4] = {L"x", L"x", L"x", L"x"};
-        CFile::SplitPath(path, pieces[0], pieces[1], pieces[2], pieces[3]);
-        EXPECT_EQ(ustring(drive) + L"|" + dir + L"|" + fname + L"|" + ext,
-                  pieces[0] + L"|" + pieces[1] + L"|" + pieces[2] + L"|" + pieces[3])
-            << Show(path);
+        ustring p[4] = {L"x", L"x", L"x", L"x"};
+        CFile::SplitPath(path, p[0], p[1], p[2], p[3]);
+        EXPECT_EQ(ustring(drive) + L"|" + dir + L"|" + fname + L"|" + ext, p[0] + L"|" + p[1] + L"|" + p[2] + L"|" + p[3]) << Show(path);
     }
 }
 
 TEST(CFilePathTest, UpdateFileName)
 {
-    using S = const wchar_t*;
     const std::tuple<S, S, S> rows[] = {
-        {L"C:\\a\\b.txt", L"c.dat", L"C:\\a\\c.dat"},
-        {L"", L"c.dat", L"c.dat"},
-        {NULL, L"c.dat", L"c.dat"},
-        {NULL, NULL, L""},
-        {L"b.txt", L"c", L"c"},
-        {L"C:/a/b.txt", L"sub/c.dat", L"C:\\a\\sub\\c.dat"},
-        {L"C:\\a.d\\b", L"c", L"C:\\a.d\\c"},
+        {L"C:\\a\\b.txt", L"c.dat", L"C:\\a\\c.dat"}, {L"", L"c.dat", L"c.dat"}, {NULL, L"c.dat", L"c.dat"}, {NULL, NULL, L""},
+        {L"b.txt", L"c", L"c"}, {L"C:/a/b.txt", L"sub/c.dat", L"C:\\a\\sub\\c.dat"}, {L"C:\\a.d\\b", L"c", L"C:\\a.d\\c"},
         {L"\\\\server\\share\\b.txt", L"c", L"\\server\\share\\c"},
         // The drive and an empty folder are joined by a separator: a drive-relative name becomes rooted.
         {L"C:b.txt", L"c", L"C:\\c"},
@@ -85,23 +62,16 @@ TEST(CFilePathTest, UpdateFileName)
 
 TEST(CFilePathTest, IsParentFolder)
 {
-    const std::tuple<const wchar_t*, const wchar_t*, bool> rows[] = {
-        {L"C:\\Data\\x", L"c:/data/", true},
-        {L"C:\\data", L"C:\\data\\x", false},
-        {L"C:\\data", L"C:\\DATA\\", true},
-        {L"C:\\data\\x", L"D:\\data", false},
-        {L"C:\\data\\x", L"C:", true},
-        {L"C:\\data.d\\x", L"C:\\data", false},
-        {L"//server/share/x", L"\\\\SERVER\\share\\", true},
+    const std::tuple<S, S, bool> rows[] = {
+        {L"C:\\Data\\x", L"c:/data/", true}, {L"C:\\data", L"C:\\data\\x", false}, {L"C:\\data", L"C:\\DATA\\", true},
+        {L"C:\\data\\x", L"D:\\data", false}, {L"C:\\data\\x", L"C:", true}, {L"C:\\data.d\\x", L"C:\\data", false},
+        {L"//server/share/x", L"\\\\SERVER\\share\\", true}, {L"C:\\a\\\\b", L"C:\\a\\b", false},
         // A share and a rooted folder of the same name are different places.
         {L"\\\\server\\share\\x", L"\\server\\share", false},
-        {L"C:\\a\\\\b", L"C:\\a\\b", false},
         // An empty folder has no components, so it is everyone's parent; an empty path has none to offer.
-        {L"C:\\data", L"", true},
-        {L"C:\\data", NULL, true},
-        {L"", L"C:", false},
-        {NULL, L"C:", false},
+        {L"C:\\data", L"", true}, {L"C:\\data", NULL, true}, {L"", L"C:", false}, {NULL, L"C:", false},
     };
     for (const auto& [path, folder, expected] : rows)
         EXPECT_EQ(expected, CFile::IsParentFolder(path, folder)) << Show(path) << Show(folder);
 }
+// clang-format on
