@@ -3,34 +3,25 @@
 #pragma once
 
 #include <ostrand/platform.h>
-
 #include <gtest/gtest.h>
 #include <shlobj.h>
-
 #include <fstream>
 #include <regex>
 
 namespace logtest
 {
 
-struct ParsedBlock
-{
-    char kind = 'T'; // 'T' text event, 'W' sent (WRITE), 'R' received (READ)
-    bool sync = true;
-    unsigned long long time = 0;     // local time as yyyymmddhhmmssmmm
-    std::vector<unsigned char> data; // reconstructed from the hex column
-    std::string text;                // the UTF-8 text of a text event
-};
+using Strings = std::vector<std::string>;
 
 // One dump line: a space, 32 cells of "XX " (upper case) or of three spaces after the data, four spaces,
 // then each byte as itself when 0x21..0x7E, else '.'. Appends the bytes; false when malformed.
-inline bool DumpLine(const std::string& s, std::vector<unsigned char>& out)
+inline bool DumpLine(const std::string& s, std::string& out)
 {
     static const char hex[] = "0123456789ABCDEF";
     size_t n = 0;
     while (n < 32 && 3 * n + 3 < s.size() && s[3 * n + 1] != ' ')
-        out.push_back(static_cast<unsigned char>(std::stoul(s.substr(3 * n++ + 1, 2), nullptr, 16)));
-    const unsigned char* b = out.data() + out.size() - n;
+        out.push_back(char(std::stoul(s.substr(3 * n++ + 1, 2), nullptr, 16)));
+    const unsigned char* b = reinterpret_cast<const unsigned char*>(out.data() + out.size() - n);
     std::string expected = " ";
     for (size_t i = 0; i < 32; ++i)
         expected += i < n ? std::string{hex[b[i] >> 4], hex[b[i] & 15], ' '} : "   ";
@@ -40,66 +31,51 @@ inline bool DumpLine(const std::string& s, std::vector<unsigned char>& out)
     return n > 0 && s == expected;
 }
 
-// Splits the file into blocks; a part that breaks the format fails the test.
-inline std::vector<ParsedBlock> ParseFile(const std::wstring& path)
+// Each block as a string: a text event's text, or "sent "/"received ", the bytes and " async" when
+// ASYNC. A part that breaks the format, or a time stamp (yyyymmddhhmmssmmm) outside from..to, fails the test.
+inline Strings ParseFile(const std::wstring& path, unsigned long long from = 0, unsigned long long to = ~0ull)
 {
     static const std::regex header("(?:Text Event|(A?SYNC) (WRITE|READ) request completed: (0|[1-9][0-9]*) "
-                                   "\\(0x(0|[1-9A-F][0-9A-F]*)\\) bytes), ([0-9]{4})/([1-9][0-9]?)/"
-                                   "([1-9][0-9]?), ([0-9]{2}):([0-9]{2}):([0-9]{2})\\.([0-9]{3})");
+                                   "\\(0x(0|[1-9A-F][0-9A-F]*)\\) bytes), ([0-9]{4})/([1-9]|1[0-2])/"
+                                   "([1-9]|[12][0-9]|3[01]), ([01][0-9]|2[0-3]):([0-5][0-9]):"
+                                   "([0-5][0-9])\\.([0-9]{3})");
     std::ifstream in(path.c_str(), std::ios::binary); // _wfopen shares reading and writing
     const std::string f{std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
-    std::vector<ParsedBlock> blocks;
-    size_t p = 0;
-    std::string line;
-    const auto nextLine = [&]
+    Strings lines, blocks;
+    size_t l = 0, e = 0;
+    for (size_t p = 0; p < f.size(); p = e == std::string::npos ? f.size() : e + 2)
+        lines.push_back(f.substr(p, (e = f.find("\r\n", p)) - p)); // no CR LF at the e: a bad block
+    const auto fail = [&](const char* what) { return ADD_FAILURE() << what << " at line " << l, blocks; };
+    for (std::smatch m; l < lines.size(); ++l) // a byte-order mark fails the first header
     {
-        const size_t end = f.find("\r\n", p);
-        line = f.substr(p, end - p);
-        p = end == std::string::npos ? f.size() : end + 2;
-        return end != std::string::npos;
-    };
-    const auto fail = [&](const std::string& what)
-    {
-        ADD_FAILURE() << what << " before byte " << p << " of " << f.size();
-        return blocks;
-    };
-    if (f.compare(0, 3, "\xEF\xBB\xBF") == 0)
-        return fail("byte-order mark");
-    std::smatch m;
-    while (p < f.size())
-    {
-        if (!nextLine() || !std::regex_match(line, m, header))
-            return fail("bad header '" + line + "'");
-        ParsedBlock b;
-        unsigned t[7];
-        for (int i = 0; i < 7; ++i)
-            b.time = b.time * (i == 6 ? 1000 : 100) + (t[i] = unsigned(std::stoul(m[5 + i].str())));
-        if (t[1] > 12 || t[2] > 31 || t[3] > 23 || t[4] > 59 || t[5] > 59)
-            return fail("bad time stamp");
-        if (!m[1].matched) // a text runs to the first empty line before the end or another header
+        if (!std::regex_match(lines[l], m, header))
+            return fail("bad header");
+        unsigned long long time = 0;
+        for (int i = 5; i < 12; ++i)
+            time = time * (i == 11 ? 1000 : 100) + std::stoul(m[i].str());
+        if (time < from || time > to)
+            return fail("time stamp out of range");
+        std::string block;
+        if (!m[1].matched) // a text runs to the first empty line before the e or another header
         {
-            size_t end = p;
-            while ((end = f.find("\r\n\r\n", end)) != std::string::npos && end + 4 < f.size() &&
-                   !std::regex_search(f.begin() + end + 4, f.end(), header,
-                                      std::regex_constants::match_continuous))
-                ++end;
-            if (end == std::string::npos)
-                return fail("text without its empty line");
-            b.text.assign(f, p, end - p);
-            p = end + 4;
+            for (e = ++l; e < lines.size(); ++e)
+                if (lines[e].empty() && (e + 1 == lines.size() || std::regex_match(lines[e + 1], header)))
+                    break;
+            for (; l < e; ++l)
+                block += lines[l] + (l + 1 < e ? "\r\n" : "");
         }
         else
         {
-            b.sync = m[1] == "SYNC";
-            b.kind = m[2].str()[0];
-            const unsigned long count = std::stoul(m[3].str()), hex = std::stoul(m[4].str(), nullptr, 16);
-            while (nextLine() && !line.empty())
-                if (b.data.size() % 32 != 0 || !DumpLine(line, b.data))
-                    return fail("bad dump line '" + line + "'");
-            if (count != b.data.size() || hex != count || f.compare(p - 4, 4, "\r\n\r\n") != 0)
-                return fail("byte counts or the end of the dump wrong");
+            while (++l < lines.size() && !lines[l].empty())
+                if (block.size() % 32 != 0 || !DumpLine(lines[l], block))
+                    return fail("bad dump line");
+            if (std::to_string(block.size()) != m[3] || std::stoul(m[4].str(), nullptr, 16) != block.size())
+                return fail("wrong byte count");
+            block = (m[2] == "WRITE" ? "sent " : "received ") + block + (m[1] == "SYNC" ? "" : " async");
         }
-        blocks.push_back(std::move(b));
+        if (l == lines.size())
+            return fail("no empty line at the e of the block");
+        blocks.push_back(block);
     }
     return blocks;
 }
@@ -108,34 +84,17 @@ inline std::wstring DebugFolder()
 {
     wchar_t path[MAX_PATH] = {};
     EXPECT_TRUE(SUCCEEDED(::SHGetFolderPathW(NULL, CSIDL_PERSONAL, NULL, 0, path)));
-    return std::wstring(path) + L"\\_Debug";
+    return std::wstring(path) + L"\\_Debug\\";
 }
 
-// Names of the files that match `pattern` (a path with wildcards).
 inline std::vector<std::wstring> FindFiles(const std::wstring& pattern)
 {
     std::vector<std::wstring> names;
     WIN32_FIND_DATAW data;
     const HANDLE h = ::FindFirstFileW(pattern.c_str(), &data);
-    for (bool more = h != INVALID_HANDLE_VALUE; more; more = ::FindNextFileW(h, &data))
+    for (bool more = h != INVALID_HANDLE_VALUE; more; more = ::FindNextFileW(h, &data) || !::FindClose(h))
         names.push_back(data.cFileName);
-    if (h != INVALID_HANDLE_VALUE)
-        ::FindClose(h);
     return names;
-}
-
-using Strings = std::vector<std::string>;
-
-// Each block as one string: a text event's text, or "sent "/"received " and the bytes, then " async".
-inline Strings Texts(const std::vector<ParsedBlock>& blocks)
-{
-    Strings texts;
-    for (const ParsedBlock& b : blocks)
-        texts.push_back(b.kind == 'T'
-                            ? b.text
-                            : (b.kind == 'W' ? "sent " : "received ") +
-                                  std::string(b.data.begin(), b.data.end()) + (b.sync ? "" : " async"));
-    return texts;
 }
 
 inline unsigned long long NowKey()
