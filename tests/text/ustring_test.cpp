@@ -1,108 +1,233 @@
-// ustring: construction, conversion, resources, formatting and comparison.
+// ustring: construction, conversion, resources, formatting, comparison, editing, masks and random bad input.
 #include <ostrand/text/ustring.h>
 #include <gtest/gtest.h>
 #include <oleauto.h>
-#include <cstring>
+#include <algorithm>
+#include <cwchar>
+#include <cwctype>
+#include <random>
+#include <set>
 #include <stdexcept>
 #include <tuple>
+#include <vector>
 
 using ostrand::ustring;
 
-TEST(UstringTest, ConstructionIndexAndResources)
+TEST(UstringTest, ConstructionResourcesConversionsSprintfAndComparison)
 {
     const wchar_t units[] = {L'a', L'b', L'\0', L'c', L'd'};
     EXPECT_EQ(2u, ustring(units, ustring::npos).size());
     EXPECT_TRUE(ustring(nullptr, 3).empty() && ustring(_bstr_t(static_cast<BSTR>(nullptr), false)).empty());
-    ustring s(L"x");
+    ustring s(L"x"), x;
     EXPECT_TRUE((s = static_cast<const wchar_t*>(nullptr)).empty());
-    // The BSTR is handed over to the _bstr_t (no copy), which frees it.
-    EXPECT_EQ(ustring(units, 5), ustring(_bstr_t(::SysAllocStringLen(units, 5), false)));
-    s = _bstr_t(L"new");
-    EXPECT_EQ(L'w', s[2]);
+    EXPECT_EQ(ustring(units, 5), ustring(_bstr_t(::SysAllocStringLen(units, 5), false))); // taken, not copied
+    EXPECT_EQ(L'w', (s = _bstr_t(L"new"))[2]);
     EXPECT_THROW(static_cast<const ustring&>(s)[3], std::out_of_range); // operator[](size()) too
     EXPECT_THROW(ustring()[0], std::out_of_range);
-    HINSTANCE self = ::GetModuleHandleW(NULL); // resource strings of any length load whole
-    ustring x;
-    ASSERT_TRUE(s.load(self, 3)); // exactly fills a first buffer of 255 units
-    EXPECT_EQ(ustring(255, L'x'), s);
-    ASSERT_TRUE(s.load(self, 2));
-    EXPECT_EQ(ustring(300, L'L') + L"-end", s);
-    EXPECT_TRUE(x.xload(self, 2)); // no translator yet: xload gives exactly what load gives
-    EXPECT_EQ(s, x);
+    // String 3 exactly fills a first buffer of 255 units; no translator yet: xload gives what load gives.
+    HINSTANCE self = ::GetModuleHandleW(NULL);
+    EXPECT_TRUE(s.load(self, 3) && s == ustring(255, L'x'));
+    EXPECT_TRUE(s.load(self, 2) && x.xload(self, 2) && s == ustring(300, L'L') + L"-end" && x == s);
     EXPECT_TRUE(!s.load(self, 4711) && s.empty());
-}
-
-TEST(UstringTest, CodePageConversions)
-{
     // Every UTF-8 sequence length, a surrogate pair and an embedded zero survive a round trip.
     const ustring wide(L"a\x00E9\x20AC\xD83D\xDE00z\0end", 10);
     const std::string utf8("a\xC3\xA9\xE2\x82\xAC\xF0\x9F\x98\x80z\0end", 15);
-    EXPECT_EQ(utf8, ustring::WideCharToMultiByte(wide, CP_UTF8, 0));
-    EXPECT_EQ(wide, ustring(utf8, CP_UTF8, 0));
-    // npos: up to the terminator; an incomplete sequence before it still gives a replacement character.
+    EXPECT_TRUE(utf8 == ustring::WideCharToMultiByte(wide, CP_UTF8, 0) && wide == ustring(utf8, CP_UTF8, 0));
+    // npos: up to the terminator; an incomplete sequence before it still gives a replacement character;
+    // invalid input with MB_ERR_INVALID_CHARS is rejected whole, without an exception.
     EXPECT_EQ(ustring(L"a\x00E9"), ustring::MultiByteToWideChar("a\xC3\xA9\0t", ustring::npos, CP_UTF8, 0));
     EXPECT_EQ(ustring(L"ab\xFFFD"), ustring::MultiByteToWideChar("ab\xC3", ustring::npos, CP_UTF8, 0));
-    EXPECT_EQ(std::string("ab\xEF\xBF\xBD"),
-              ustring::WideCharToMultiByte(L"ab\xD800", ustring::npos, CP_UTF8, 0));
     EXPECT_TRUE(ustring::MultiByteToWideChar(nullptr, 4, CP_UTF8, 0).empty());
-    for (const char* bad : {"\xFF", "ok\xC3", "\xED\xA0\x80", "\xC0\xAF", "a\x80z"})
-    {
-        SCOPED_TRACE(bad); // rejected whole with MB_ERR_INVALID_CHARS, never an exception
-        EXPECT_TRUE(ustring(std::string(bad), CP_UTF8, MB_ERR_INVALID_CHARS).empty());
-        EXPECT_FALSE(ustring::MultiByteToWideChar(bad, std::strlen(bad), CP_UTF8, 0).empty());
-    }
     EXPECT_EQ(ustring(L"\x00E9"), ustring::MultiByteToWideChar("\xE9", 1, 1252, 0));
-}
-
-TEST(UstringTest, SprintfLegacyWideModeLongOutputAndSelfArguments)
-{
-    ustring s(L"kept");
+    EXPECT_EQ("ab\xEF\xBF\xBD", ustring::WideCharToMultiByte(L"ab\xD800", ustring::npos, CP_UTF8, 0));
+    for (const char* bad : {"\xFF", "ok\xC3", "\xED\xA0\x80", "\xC0\xAF", "a\x80z"})
+        EXPECT_TRUE(ustring(std::string(bad), CP_UTF8, MB_ERR_INVALID_CHARS).empty() &&
+                    !ustring::MultiByteToWideChar(bad, ustring::npos, CP_UTF8, 0).empty());
+    s = L"kept";
     EXPECT_THROW(s.sprintf(nullptr), std::invalid_argument); // Wine's msvcrt accepts any other format
     EXPECT_EQ(ustring(L"kept"), s);
     s.sprintf(L"%s|%S|%c|%C|%I64u|0x%X", L"wide", "narrow", L'w', 'n', 18446744073709551615ull, 0xBEEFu);
     EXPECT_EQ(ustring(L"wide|narrow|w|n|18446744073709551615|0xBEEF"), s);
     for (size_t n : {1023u, 1024u, 1025u, 5000u}) // around the first buffer of 1024 units
-    {
-        s.sprintf(L"<%s", ustring(n - 1, L'y').c_str());
-        EXPECT_EQ(L'<' + ustring(n - 1, L'y'), s);
-    }
+        EXPECT_EQ(L'<' + ustring(n - 1, L'y'), (s.sprintf(L"<%s", ustring(n - 1, L'y').c_str()), s));
     s.assign(1500, L'q'); // the argument points into the string, and the result needs a new buffer
-    const ustring expected = s + L"|" + s;
-    s.sprintf(L"%s|%s", s.c_str(), s.c_str());
-    EXPECT_EQ(expected, s);
-}
-
-TEST(UstringTest, CompareReturnsTheCodeUnitDifferenceAndFunctorsOrder)
-{
+    const ustring twice = s + L"|" + s;
+    EXPECT_EQ(twice, (s.sprintf(L"%s|%s", s.c_str(), s.c_str()), s));
     const size_t all = ustring::npos; // a trailing zero unit equals an absent one; units are unsigned
     // clang-format off
-    const std::tuple<ustring, ustring, size_t, int> rows[] = {
-        {L"a", L"ab", all, -98}, {L"abcX", L"abcY", 3, 0}, {L"abcX", L"abcY", 4, -1}, {L"x", L"yz", 0, 0},
-        {ustring(L"a\0", 2), L"a", all, 0}, {L"\xFFFF", L"\x0001", all, 65534}, {L"", L"\xFFFF", all, -65535},
-        {L"\xD800", L"\x7FFF", all, 0xD800 - 0x7FFF}};
+    const std::tuple<ustring, ustring, size_t, bool, int> rows[] = { // a, b, count, without case, result
+        {L"a", L"ab", all, false, -98}, {L"abcX", L"abcY", 3, false, 0}, {L"abcX", L"abcY", 4, false, -1},
+        {L"x", L"yz", 0, false, 0}, {ustring(L"a\0", 2), L"a", all, false, 0}, {L"\xFFFF", L"\x0001", all, false, 65534},
+        {L"", L"\xFFFF", all, false, -65535}, {L"\xD800", L"\x7FFF", all, false, 0xD800 - 0x7FFF},
+        {L"xYZ", L"xya", all, true, L'z' - L'a'}, {L"ABcd", L"abCE", 3, true, 0}, {L"", L"A", all, true, -L'a'}};
     // clang-format on
-    for (const auto& [a, b, count, expected] : rows)
-    {
-        EXPECT_EQ(expected, a.compare(b, count)) << expected;
-        EXPECT_EQ(-expected, b.compare(a, count)) << expected;
-        const bool operatorsFollow =
-            (a == b) == (expected == 0) && (a < b) == (expected < 0) && (a >= b.c_str()) == (expected >= 0);
-        EXPECT_TRUE(count != all || operatorsFollow) << expected;
-    }
-    EXPECT_EQ(L'z' - L'a', ustring(L"xYZ").compareNoCase(L"xya", ustring::npos));
-    EXPECT_EQ(0, ustring(L"ABcd").compareNoCase(L"abCE", 3));
-    EXPECT_EQ(-L'a', ustring(L"").compareNoCase(L"A", ustring::npos));
-    EXPECT_TRUE(ustring() == static_cast<const wchar_t*>(nullptr)); // a null pointer is the empty text
-    EXPECT_TRUE(ustring(L"a") > static_cast<const wchar_t*>(nullptr));
+    for (const auto& [a, b, count, noCase, expected] : rows)
+        EXPECT_TRUE((noCase ? a.compareNoCase(b, count) : a.compare(b, count)) == expected &&
+                    (noCase ? b.compareNoCase(a, count) : b.compare(a, count)) == -expected);
+    const ustring high(L"\xFFFF"); // the operators follow compare; a null pointer is the empty text
+    const wchar_t* const null = nullptr;
+    EXPECT_TRUE(high > L"\x0001" && !(high < L"\x0001") && high > null && ustring() == null &&
+                ustring(L"a\0", 2) == L"a");
     const ostrand::LessStrNotCaseSensitiveW ci;
-    EXPECT_TRUE(ostrand::LessStrCaseSensitiveW()(L"B", L"a"));
-    EXPECT_TRUE(ci(L"a", L"B") && !ci(L"B", L"a") && !ci(L"ABC", L"abc") && !ci(L"abc", L"ABC"));
+    EXPECT_TRUE(ostrand::LessStrCaseSensitiveW()(L"B", L"a") && ci(L"a", L"B") && !ci(L"B", L"a") &&
+                !ci(L"ABC", L"abc") && !ci(L"abc", L"ABC"));
     const ostrand::LessStrWN wn; // only the first number counts; no digits and a dropped sign count as 0
-    const wchar_t* const less[][2] = {
-        {L"file2", L"file10"}, {L"b2", L"a3"}, {L"2", L"-3"}, {L"v1.9", L"v2.0"}};
-    for (const auto& r : less)
-        EXPECT_TRUE(wn(r[0], r[1]) && !wn(r[1], r[0])) << r[0];
-    const wchar_t* const same[][2] = {{L"x7", L"y7"}, {L"abc", L"x0"}, {L"99999999999", L"2147483647"}};
-    for (const auto& r : same)
-        EXPECT_TRUE(!wn(r[0], r[1]) && !wn(r[1], r[0])) << r[0];
+    // clang-format off
+    const std::tuple<const wchar_t*, const wchar_t*, bool> numbered[] = {{L"file2", L"file10", true}, {L"b2", L"a3", true},
+        {L"2", L"-3", true}, {L"v1.9", L"v2.0", true}, {L"x7", L"y7", false}, {L"abc", L"x0", false},
+        {L"99999999999", L"2147483647", false}};
+    // clang-format on
+    for (const auto& [a, b, less] : numbered)
+        EXPECT_TRUE(wn(a, b) == less && !wn(b, a)) << a;
+}
+
+TEST(UstringEditTest, EditsHexGuidSplitAndSubstr)
+{
+    // Case mapping passes embedded zeros; inserted digits are not encoded again; e-acute is a letter, the
+    // snowman not. Hex2Bin ("!": failed) skips blanks, drops an odd last digit, takes full-width digits,
+    // clears stale output. GUID text round trip ("!": rejected with an all-zero GUID, even where the system
+    // wrote part of it).
+    // clang-format off
+    const auto hex = [](ustring s) { std::vector<unsigned char> b{0x99}; const bool ok = ustring::Hex2Bin(s, b); return ustring::Bin2Hex(b, s), (ok ? L"" : L"!") + s; };
+    const auto guid = [](ustring s) { GUID g = {1, 2, 3, {4}}; return ustring::String2GUID(s.c_str(), g) && ustring::GUID2String(g, s) ? s : IsEqualGUID(g, GUID()) ? L"!" : L"?"; };
+    const std::tuple<ustring, ustring (*)(ustring), ustring> edits[] = {
+        {L"   ", [](ustring s) { return s.trim(L' '), s; }, L""}, {ustring(L"\0\0", 2), [](ustring s) { return s.trim(L'\0'), s; }, L""},
+        {L"  a  ", [](ustring s) { return s.trim_left(L' '), s; }, L"a  "}, {L"\n\"x\"\n", [](ustring s) { return s.trim(std::vector<wchar_t>{L'"', L'\n'}), s; }, L"x"},
+        {ustring(L"AbC1_z\0Q", 8), [](ustring s) { return s.strlwr(), s; }, ustring(L"abc1_z\0q", 8)},
+        {ustring(L"AbC1_z\0q", 8), [](ustring s) { return s.strupr(), s; }, ustring(L"ABC1_Z\0Q", 8)},
+        {L"1%\x0F|\x0ABC|\xFFFF|\xD800", [](ustring s) { return s.replaceForbiddenSymbols(L"%1\x0F\x0ABC\xFFFF\xD800"), s; }, L"%31%25%0F|%ABC|%FFFF|%D800"},
+        {ustring(L"Z9-\x00E9\x2603\0", 6), [](ustring s) { return s.replaceNonAlphaNumericSymbols(), s; }, L"Z9%2D\x00E9%2603%00"},
+        {L"stale", [](ustring s) { return ustring::Bin2Hex({0x00, 0x0A, 0xFF}, s), s; }, L"000AFF"},
+        {L"0A 1b", hex, L"0A1B"}, {L"A\r\n\tBC", hex, L"AB"}, {L"\xFF10\xFF21\xFF46", hex, L"0A"}, {L"0G", hex, L"!"},
+        {L"0x0A", hex, L"!"}, {ustring(L"00\0", 3), hex, L"!"}, {L"{6B29FC40-CA47-1067-B31D-00DD010662DG}", guid, L"!"},
+        {L"{6b29fc40-ca47-1067-b31d-00dd010662da}", guid, L"{6B29FC40-CA47-1067-B31D-00DD010662DA}"},
+        {ustring(L"a,b;\0c", 6), [](ustring s) { return s.removeForbiddenSymbols(L",;"), s; }, ustring(L"ab\0c", 4)},
+        {ustring(L"a,b;\0c", 6), [](ustring s) { return s.removeForbiddenSymbols2(L",;"), s; }, L",;"},
+        {L"a[b]c", [](ustring s) { return s.substr(L"[", L"]", true, true); }, L"[b"}, {L"a[b", [](ustring s) { return s.substr(L"[", L"]", false, true); }, L""},
+        {L"a[b", [](ustring s) { return s.substr(L"[", L"]", false, false); }, L"b"}, {L"abc", [](ustring s) { return s.substr(L"[", L"]", false, false); }, L""},
+        {L"ab]c]", [](ustring s) { return s.substr(nullptr, L"]", false, true); }, L"ab"}, {L"<a", [](ustring s) { return s.substr(L"<", nullptr, false, true); }, L"a"},
+        {L"]x[y]", [](ustring s) { return s.substr(L"[", L"]", false, true); }, L"y"}, {L"a|b|c", [](ustring s) { return s.substr(L"|", L"|", false, true); }, L"b"}};
+    // clang-format on
+    for (const auto& [s, edit, expected] : edits)
+        EXPECT_EQ(expected, edit(s)) << s.c_str();
+    // text, delimiter (null: the multi-string form), keepLastEmpty, pieces; an empty delimiter cannot cut.
+    // clang-format off
+    const std::tuple<ustring, const wchar_t*, bool, std::vector<ustring>> rows[] = {
+        {L"a,,b", L",", false, {L"a", L"", L"b"}}, {L"a,b,", L",", true, {L"a", L"b", L""}},
+        {L"a,b,", L",", false, {L"a", L"b"}}, {L",", L",", false, {L""}}, {L"", L",", true, {}},
+        {L"x,,y, ", L", ", true, {L"x,,y", L""}}, {L"a--b---c", L"--", true, {L"a", L"b", L"-c"}},
+        {L"a,b", L"", true, {L"a,b"}}, {ustring(L"a\0b;\0", 5), L";", false, {ustring(L"a\0b", 3), ustring(L"\0", 1)}},
+        {ustring(L"a\0bc", 4), nullptr, false, {L"a", L"bc"}}, {ustring(L"a\0\0b\0\0", 6), nullptr, false, {L"a"}},
+        {ustring(L"\0a\0", 3), nullptr, false, {}}};
+    // clang-format on
+    for (const auto& [s, delimiter, keepLastEmpty, expected] : rows)
+    {
+        std::vector<ustring> v{L"stale"}, c = expected; // c: the form with a one-unit delimiter, if any
+        std::set<ustring, ostrand::LessStrCaseSensitiveW> set{L"stale"};
+        const auto split = [&text = s, d = delimiter, keep = keepLastEmpty](auto& out)
+        { d == nullptr ? ustring::split(text, out) : ustring::split(text, d, out, keep); };
+        split(v), split(set);
+        if (delimiter != nullptr && std::wcslen(delimiter) == 1)
+            ustring::split(s, delimiter[0], c, keepLastEmpty);
+        EXPECT_TRUE(v == expected && c == expected && set == decltype(set)(expected.begin(), expected.end()));
+    }
+}
+
+// The wildcard definition step by step, without any cleverness: exponential on purpose.
+static int ReferenceMask(const wchar_t* s, size_t len, const wchar_t* m, bool noCase = false)
+{
+    for (size_t i = 0; i < len; ++i, ++m)
+    {
+        if (*m == L'*')
+        {
+            m += std::wcsspn(m, L"*?");
+            for (size_t k = i; *m != L'\0' && k < len; ++k)
+                if (ReferenceMask(s + k, len - k, m, noCase) == 0)
+                    return 0;
+            return *m == L'\0' ? 0 : ReferenceMask(s, len, m, noCase); // the whole (sub)string from its start
+        }
+        const wchar_t a[2] = {s[i], L'\0'}, b[2] = {*m, L'\0'}; // wchar_t is an unsigned 16-bit unit here
+        const int c = *m == L'\0' ? 1 : *m == L'?' ? 0 : noCase ? ::_wcsicmp(a, b) : int(s[i]) - int(*m);
+        if (c != 0)
+            return (c > 0) - (c < 0);
+    }
+    return 0;
+}
+
+TEST(UstringRandomTest, MaskEqualsTheRecursiveDefinitionAndBadInputKeepsEveryInvariant)
+{
+    for (const auto& [mask, r] : {std::pair{L"a*c", 0}, {L"abd", -1}, {L"ab", 1}, {L"abcd", 0}, {L"*d", -1}})
+        EXPECT_TRUE(ReferenceMask(L"abc", 3, mask) == r && ustring(L"abc").compareWithMask(mask) == r);
+    const wchar_t stringUnits[] = L"abA*?", maskUnits[] = L"abB*?"; // the string's units include its zero
+    std::mt19937 rng(1);
+    for (int n = 0; n < 18000; ++n)
+    {
+        ustring s(rng() % 8, L' '), mask(rng() % 8, L' ');
+        for (wchar_t& c : s)
+            c = stringUnits[rng() % 6];
+        for (wchar_t& c : mask)
+            c = maskUnits[rng() % 5];
+        for (bool noCase : {false, true})
+            ASSERT_EQ(ReferenceMask(s.data(), s.size(), mask.c_str(), noCase),
+                      noCase ? s.compareWithMaskNoCase(mask.c_str()) : s.compareWithMask(mask.c_str()))
+                << n;
+    }
+    // Adversarial: the text ends inside the mask (a match); a "c" after it ends the fallback chain at "b".
+    const wchar_t* m = L"*a*a*a*a*a*a*a*a*a*b";
+    const ustring as(10000, L'a'), small = ustring(12, L'a') + L"c";
+    ASSERT_EQ(-1, ReferenceMask(small.data(), small.size(), m));
+    EXPECT_TRUE(as.compareWithMask(m) == 0 && ustring(10000, L'A').compareWithMaskNoCase(m) == 0 &&
+                (as + L"c").compareWithMask(m) == -1 && (as + L"C").compareWithMaskNoCase(m) == -1);
+    // Random texts of zeros, lone surrogates, blanks, markers and hex-like units (fixed seed): bad input.
+    rng.seed(7);
+    const auto below = [&rng](unsigned n) { return unsigned(rng() % n); };
+    const auto text = [&](unsigned maxLength, bool zeros)
+    {
+        ustring s; // zero, lone surrogate halves, full-width digits and letters, any unit, markers
+        for (unsigned n = below(maxLength + 1); s.size() < n;)
+        {
+            const wchar_t c[] = {0, wchar_t(0xD800 + below(0x800)), wchar_t(0xFF10 + below(0x40)),
+                                 wchar_t(below(0x10000)), L"aAbF09 ,;%-{}\r\n\t?*"[below(19)]};
+            if (const wchar_t u = c[std::min(below(8), 4u)]; zeros || u != 0)
+                s.push_back(u);
+        }
+        return s;
+    };
+    for (int n = 0; n < 4000; ++n)
+    {
+        SCOPED_TRACE(n);
+        const ustring s = text(24, true), set = text(3, false), what = text(2, true), with = text(3, true);
+        bool lone = false; // strict conversion rejects exactly the texts with a lone surrogate
+        for (size_t i = 0; i < s.size(); ++i)
+            lone = lone ||
+                   ((s[i] & 0xFC00) == 0xD800 && (i + 1 == s.size() || (s[i + 1] & 0xFC00) != 0xDC00)) ||
+                   ((s[i] & 0xFC00) == 0xDC00 && (i == 0 || (s[i - 1] & 0xFC00) != 0xD800));
+        const std::string strictUtf8 = ustring::WideCharToMultiByte(s, CP_UTF8, WC_ERR_INVALID_CHARS);
+        ASSERT_TRUE(lone ? strictUtf8.empty() : s == ustring(strictUtf8, CP_UTF8, MB_ERR_INVALID_CHARS));
+        // Mostly invalid UTF-8: what strict conversion accepts converts back exactly.
+        const std::string bytes(reinterpret_cast<const char*>(s.data()), s.size() * 2);
+        const ustring strict(bytes, CP_UTF8, MB_ERR_INVALID_CHARS);
+        ASSERT_TRUE(strict.empty() || bytes == ustring::WideCharToMultiByte(strict, CP_UTF8, 0));
+        std::vector<ustring> pieces; // the pieces, free of the delimiter, joined by it give the text back
+        ustring::split(s, set.c_str(), pieces, true);
+        ustring joined = pieces.empty() ? ustring() : pieces[0], replaced = s, plain;
+        for (size_t i = 1; i < pieces.size(); ++i)
+            joined += set + pieces[i];
+        ASSERT_EQ(s, joined);
+        for (const ustring& piece : pieces)
+            ASSERT_TRUE(set.empty() || piece.find(set) == ustring::npos);
+        replaced.replace(what, with); // replace equals a plain left-to-right loop
+        size_t from = 0;
+        for (size_t p; !what.empty() && (p = s.find(what, from)) != ustring::npos; from = p + what.size())
+            plain.append(s, from, p - from).append(with);
+        ASSERT_EQ(plain.append(s, from, ustring::npos), replaced);
+        const bool hex =
+            std::all_of(s.begin(), s.end(),
+                        [](wchar_t c) { return ::iswxdigit(c) || (c != 0 && std::wcschr(L" \r\n\t", c)); });
+        std::vector<unsigned char> bin{0x55};
+        ASSERT_TRUE(hex == ustring::Hex2Bin(s, bin) &&
+                    bin.size() == (hex ? size_t(std::count_if(s.begin(), s.end(), ::iswxdigit)) / 2 : 0u));
+        GUID guid = {0x12345678, 1, 2, {3}}; // text of any shape: accepted, or rejected with a zero GUID
+        ASSERT_TRUE(ustring::String2GUID(text(40, false).c_str(), guid) || IsEqualGUID(GUID(), guid));
+    }
 }
