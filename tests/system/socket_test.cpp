@@ -5,6 +5,7 @@
 #include <ostrand/system/Socket.h>
 
 #include "../support/ChildProcess.h"
+#include "system_test_util.h"
 
 #include <gtest/gtest.h>
 
@@ -34,22 +35,6 @@ sockaddr_in Loopback(unsigned short port)
     a.sin_port = ::htons(port);
     a.sin_addr.s_addr = ::htonl(INADDR_LOOPBACK);
     return a;
-}
-
-template <class F> void ExpectWinException(F f, const wchar_t* call, DWORD code)
-{
-    try
-    {
-        f();
-        ADD_FAILURE() << "no exception";
-    }
-    catch (const CWinException& e)
-    {
-        EXPECT_EQ(ustring(call), e.GetFunction());
-        EXPECT_EQ(code, e.GetErrorCode());
-        EXPECT_EQ(ustring(L"Socket"), e.GetFileName());
-        EXPECT_GT(e.GetLine(), 0u);
-    }
 }
 
 // A listener on a free loopback port; the peer process connects to it, waits and sends a text.
@@ -135,12 +120,12 @@ TEST(CWSASocketTest, CloseAndDetachLeaveTheObjectEmpty)
     CWSASocket bogus;
     ASSERT_TRUE(bogus.Attach(static_cast<SOCKET>(0x7FFF0)));
     EXPECT_FALSE(bogus.Attach(static_cast<SOCKET>(0x7FFF4)));
-    ExpectWinException([&] { bogus.Close(); }, L"setsockopt", WSAENOTSOCK);
+    ExpectWin([&] { bogus.Close(); }, WSAENOTSOCK, L"setsockopt", L"Socket");
     EXPECT_FALSE(bogus.IsCreated());
     unsigned __int64 n = 0;
     DWORD flags = 0;
     char buffer[4];
-    ExpectWinException([&] { empty.Recv(buffer, sizeof buffer, n, flags); }, L"WSARecv", WSAENOTSOCK);
+    ExpectWin([&] { empty.Recv(buffer, sizeof buffer, n, flags); }, WSAENOTSOCK, L"WSARecv", L"Socket");
 
     CWSASocket a;
     a.Create(AF_INET, SOCK_DGRAM, IPPROTO_UDP);
