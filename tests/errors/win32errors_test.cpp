@@ -34,8 +34,8 @@ TEST(Win32ErrorsFileTest, FileFormatMissingFileAndRandomFiles)
                                 (std::fclose(file) == 0));
         ustring text, fallback;
         const bool found = CWinException(0, NULL, NULL, code).GetErrorMessage(text);
-        fallback.sprintf(L"Unknown error: %d (0x%X).", code, code);
-        EXPECT_TRUE(found || text == fallback) << text.c_str();
+        EXPECT_TRUE(found || (fallback.sprintf(L"Unknown error: %d (0x%X).", code, code), text == fallback))
+            << text.c_str();
         return found ? text : kFallback;
     };
     const std::wstring big(1 << 20, L'A'),
@@ -47,28 +47,26 @@ TEST(Win32ErrorsFileTest, FileFormatMissingFileAndRandomFiles)
     // trimmed then unquoted; carriage returns and empty lines are ignored; a line needs its line feed.
     // clang-format off
     const std::tuple<std::string, DWORD, ustring> rows[] = {
-        {Utf16(L"0x2000ABCD,hex\r\n"), kA, L"hex"}, {Utf16(L"  0X2000abce  ,a, b\n"), kB, L"a, b"},
-        {Utf16(L"536914893,decimal\n"), kA, L"decimal"}, {Utf16(L"0x2000ABCDzz,x\n"), kA, L"x"},
-        {Utf16(L"2000ABCD,not hex\n"), kA, kFallback}, {Utf16(L"0x2000ABCD,  \"a\\nb\"  \n"), kA, L"a\nb"},
-        {Utf16(L"0x2000ABCD,say \\\"hi\\\"\\rnow\n"), kA, L"say \"hi\"\rnow"}, {Utf16(L"0x2000ABCD,\"open\n"), kA, L"open"},
-        {Utf16(L"\n\r\n\n0x2000\rABCD,x\ry\r\r\n"), kA, L"xy"}, {Utf16(L"0x2000ABCE,ended\n0x2000ABCD,last"), kA, kFallback},
-        {Utf16(L"0x2000ABCE,ended\n0x2000ABCD,last"), kB, L"ended"}, {Utf16(L"0x2000ABCD,x") + "\n", kA, kFallback},
-        {Utf16(L"0x2000ABCD,x\n") + "\n", kA, L"x"}, {Utf16(hides), kB, L"joined"}, {Utf16(hides), kA, kFallback},
-        {Utf16(hides), kC, L"after"}, {Utf16(L"0x2000ABCD,no mark\n", false), kA, kFallback},
-        {"\xFE\xFF" + Utf16(L"0x2000ABCD,big-endian\n", false), kA, kFallback}, {"\xFF", kA, kFallback}, {"", kA, kFallback},
+        {Utf16(L"0x2000ABCD,hex\r\n"), kA, L"hex"}, {Utf16(L"  0X2000abce  ,a, b\n"), kB, L"a, b"}, {Utf16(L"536914893,decimal\n"), kA, L"decimal"},
+        {Utf16(L"0x2000ABCDzz,x\n"), kA, L"x"}, {Utf16(L"2000ABCD,not hex\n"), kA, kFallback}, {Utf16(L"0x2000ABCD,  \"a\\nb\"  \n"), kA, L"a\nb"},
+        {Utf16(L"0x2000ABCD,say \\\"hi\\\"\\rnow\n"), kA, L"say \"hi\"\rnow"}, {Utf16(L"0x2000ABCD,\"open\n"), kA, L"open"}, {Utf16(hides), kC, L"after"},
+        {Utf16(L"\n\r\n\n0x2000\rABCD,x\ry\r\r\n"), kA, L"xy"}, {Utf16(L"0x2000ABCE,ended\n0x2000ABCD,last"), kA, kFallback}, {Utf16(hides), kA, kFallback},
+        {Utf16(L"0x2000ABCE,ended\n0x2000ABCD,last"), kB, L"ended"}, {Utf16(L"0x2000ABCD,x") + "\n", kA, kFallback}, {Utf16(hides), kB, L"joined"},
+        {Utf16(L"0x2000ABCD,x\n") + "\n", kA, L"x"}, {Utf16(L"0x2000ABCD,no mark\n", false), kA, kFallback}, {"\xFF", kA, kFallback}, {"", kA, kFallback},
+        {"\xFE\xFF" + Utf16(L"0x2000ABCD,big-endian\n", false), kA, kFallback}, {Utf16(L"0x2000ABCD," + big), kA, kFallback},
         {Utf16(big + L"\n0x2000ABCD,hidden\n0x2000ABCE,after\n"), kB, L"after"}, {Utf16(L"0x2000ABCD," + big + L"\n"), kA, big},
-        {Utf16(L"0x2000ABCD," + big), kA, kFallback}, {Utf16(L"2,from the file\n"), ERROR_FILE_NOT_FOUND, system}};
+        {Utf16(L"2,from the file\n"), ERROR_FILE_NOT_FOUND, system}};
     // clang-format on
     for (const auto& [bytes, code, expected] : rows)
         EXPECT_EQ(expected, lookUp(bytes, code)) << bytes.size() << " bytes, code " << code;
-    ::DeleteFileW(path.c_str()); // no file
-    ustring message;
-    EXPECT_FALSE(CWinException(0, NULL, NULL, 0xE000ABCD).GetErrorMessage(message));
-    EXPECT_EQ(ustring(L"Unknown error: -536826931 (0xE000ABCD)."), message);
+    ustring message; // no file
+    EXPECT_TRUE(::DeleteFileW(path.c_str()) &&
+                !CWinException(0, NULL, NULL, 0xE000ABCD).GetErrorMessage(message) &&
+                message == L"Unknown error: -536826931 (0xE000ABCD).");
     // Files of any content: every lookup ends, with the whole-file reading's text below or the fallback.
-    const wchar_t* const keys[] = {
-        L"0x2000ABCD", L"536914894", L"0X2000abcf", L" 0x2000ABCD ", L"junk",        L"",
-        L"0x",         L"-1",        L"4294967295", L"99999999999",  L"0x0x2000ABCD"};
+    // clang-format off
+    const wchar_t* const keys[] = {L"0x2000ABCD", L"536914894", L"0X2000abcf", L" 0x2000ABCD ", L"junk", L"", L"0x", L"-1", L"4294967295", L"99999999999", L"0x0x2000ABCD"};
+    // clang-format on
     int found = 0;
     for (unsigned seed = 1; seed <= 200; ++seed)
     {
@@ -95,15 +93,14 @@ TEST(Win32ErrorsFileTest, FileFormatMissingFileAndRandomFiles)
                 if ((comma = whole.find(L',', pos)) == ustring::npos ||
                     (lineFeed = whole.find(L'\n', comma)) == ustring::npos)
                     break;
-                ustring key(whole.substr(pos, comma - pos));
-                key.trim(L' ');
+                const ustring key = ustring(whole.substr(pos, comma - pos)).trim(L' ');
                 const bool hex = key.size() >= 2 && key[0] == L'0' && (key[1] == L'x' || key[1] == L'X');
                 if (std::wcstoul(key.c_str() + (hex ? 2 : 0), NULL, hex ? 16 : 10) != code)
                     continue;
-                expected = whole.substr(comma + 1, lineFeed - comma - 1);
-                expected.trim(L' ');
-                expected.replace(L"\\r", L"\r"), expected.replace(L"\\n", L"\n"),
-                    expected.replace(L"\\\"", L"\"");
+                expected = ustring(whole.substr(comma + 1, lineFeed - comma - 1)).trim(L' ');
+                for (const auto& [escape, unit] :
+                     {std::pair{L"\\r", L"\r"}, {L"\\n", L"\n"}, {L"\\\"", L"\""}})
+                    expected.replace(escape, unit);
                 expected.trim(L'"'), ++found;
                 break;
             }

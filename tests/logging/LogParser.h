@@ -13,24 +13,6 @@ namespace logtest
 
 using Strings = std::vector<std::string>;
 
-// One dump line: a space, 32 cells of "XX " (upper case) or of three spaces after the data, four spaces,
-// then each byte as itself when 0x21..0x7E, else '.'. Appends the bytes; false when malformed.
-inline bool DumpLine(const std::string& s, std::string& out)
-{
-    static const char hex[] = "0123456789ABCDEF";
-    size_t n = 0;
-    while (n < 32 && 3 * n + 3 < s.size() && s[3 * n + 1] != ' ')
-        out.push_back(char(std::stoul(s.substr(3 * n++ + 1, 2), nullptr, 16)));
-    const unsigned char* b = reinterpret_cast<const unsigned char*>(out.data() + out.size() - n);
-    std::string expected = " ";
-    for (size_t i = 0; i < 32; ++i)
-        expected += i < n ? std::string{hex[b[i] >> 4], hex[b[i] & 15], ' '} : "   ";
-    expected += "    ";
-    for (size_t i = 0; i < n; ++i)
-        expected += b[i] > 0x20 && b[i] < 0x7F ? char(b[i]) : '.';
-    return n > 0 && s == expected;
-}
-
 // Each block as a string: a text event's text, or "sent "/"received ", the bytes and " async" when
 // ASYNC. A part that breaks the format, or a time stamp (yyyymmddhhmmssmmm) outside from..to, fails the test.
 inline Strings ParseFile(const std::wstring& path, unsigned long long from = 0, unsigned long long to = ~0ull)
@@ -44,7 +26,7 @@ inline Strings ParseFile(const std::wstring& path, unsigned long long from = 0, 
     Strings lines, blocks;
     size_t l = 0, e = 0;
     for (size_t p = 0; p < f.size(); p = e == std::string::npos ? f.size() : e + 2)
-        lines.push_back(f.substr(p, (e = f.find("\r\n", p)) - p)); // no CR LF at the e: a bad block
+        lines.push_back(f.substr(p, (e = f.find("\r\n", p)) - p)); // no CR LF at the end: a bad block
     const auto fail = [&](const char* what) { return ADD_FAILURE() << what << " at line " << l, blocks; };
     for (std::smatch m; l < lines.size(); ++l) // a byte-order mark fails the first header
     {
@@ -56,7 +38,7 @@ inline Strings ParseFile(const std::wstring& path, unsigned long long from = 0, 
         if (time < from || time > to)
             return fail("time stamp out of range");
         std::string block;
-        if (!m[1].matched) // a text runs to the first empty line before the e or another header
+        if (!m[1].matched) // a text runs to the first empty line before the end or another header
         {
             for (e = ++l; e < lines.size(); ++e)
                 if (lines[e].empty() && (e + 1 == lines.size() || std::regex_match(lines[e + 1], header)))
@@ -66,15 +48,32 @@ inline Strings ParseFile(const std::wstring& path, unsigned long long from = 0, 
         }
         else
         {
-            while (++l < lines.size() && !lines[l].empty())
-                if (block.size() % 32 != 0 || !DumpLine(lines[l], block))
+            // A dump line: a space, 32 cells of "XX " (upper case) or of three spaces after the data, four
+            // spaces, then each byte as itself when 0x21..0x7E, else '.'; rebuilt from the bytes of the hex
+            // column.
+            for (std::string s; ++l < lines.size() && !(s = lines[l]).empty();)
+            {
+                size_t n = 0, full = block.size() % 32 == 0; // only a block's last line may be short
+                while (n < 32 && 3 * n + 3 < s.size() && s[3 * n + 1] != ' ')
+                    block.push_back(char(std::stoul(s.substr(3 * n++ + 1, 2), nullptr, 16)));
+                std::string expected = " ", text;
+                for (size_t i = 0; i < 32; ++i)
+                {
+                    const unsigned char b = i < n ? block[block.size() - n + i] : 0;
+                    expected += i < n
+                                    ? std::string{"0123456789ABCDEF"[b >> 4], "0123456789ABCDEF"[b & 15], ' '}
+                                    : "   ";
+                    text += i >= n ? "" : b > 0x20 && b < 0x7F ? std::string(1, char(b)) : ".";
+                }
+                if (!full || n == 0 || s != expected + "    " + text)
                     return fail("bad dump line");
+            }
             if (std::to_string(block.size()) != m[3] || std::stoul(m[4].str(), nullptr, 16) != block.size())
                 return fail("wrong byte count");
             block = (m[2] == "WRITE" ? "sent " : "received ") + block + (m[1] == "SYNC" ? "" : " async");
         }
         if (l == lines.size())
-            return fail("no empty line at the e of the block");
+            return fail("no empty line at the end of the block");
         blocks.push_back(block);
     }
     return blocks;
@@ -95,14 +94,6 @@ inline std::vector<std::wstring> FindFiles(const std::wstring& pattern)
     for (bool more = h != INVALID_HANDLE_VALUE; more; more = ::FindNextFileW(h, &data) || !::FindClose(h))
         names.push_back(data.cFileName);
     return names;
-}
-
-inline unsigned long long NowKey()
-{
-    SYSTEMTIME t;
-    ::GetLocalTime(&t);
-    return ((((t.wYear * 100ull + t.wMonth) * 100 + t.wDay) * 100 + t.wHour) * 100 + t.wMinute) * 100000 +
-           t.wSecond * 1000u + t.wMilliseconds;
 }
 
 } // namespace logtest

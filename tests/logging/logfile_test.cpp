@@ -8,6 +8,13 @@ using logtest::ParseFile;
 // appends, and a write that fails loses only its block.
 TEST(CLogFileTest, BlocksRoundTripOpenAppendsAndAFailedWriteLosesOnlyItsBlock)
 {
+    const auto now = []
+    {
+        SYSTEMTIME t;
+        ::GetLocalTime(&t);
+        return ((((t.wYear * 100ull + t.wMonth) * 100 + t.wDay) * 100 + t.wHour) * 100 + t.wMinute) * 100000 +
+               t.wSecond * 1000u + t.wMilliseconds;
+    };
     // clang-format off
     std::vector<std::string> texts = {"", "two\r\nlines, a bare\nline feed\r\n",
                      "Gr\xC3\xBC\xC3\x9F" "e \xE2\x80\x94 \xE6\x97\xA5\xE6\x9C\xAC \xF0\x9F\x98\x80", ""};
@@ -17,7 +24,7 @@ TEST(CLogFileTest, BlocksRoundTripOpenAppendsAndAFailedWriteLosesOnlyItsBlock)
     std::vector<std::string> expected;
     const std::wstring path = logtest::DebugFolder() + L"log-" + std::to_wstring(::GetCurrentProcessId());
     ::DeleteFileW(path.c_str());
-    const unsigned long long before = logtest::NowKey();
+    const unsigned long long before = now();
     {
         CLogFile log;
         ASSERT_TRUE(log.Open(path.c_str()));
@@ -46,16 +53,14 @@ TEST(CLogFileTest, BlocksRoundTripOpenAppendsAndAFailedWriteLosesOnlyItsBlock)
     CLogFile log;
     EXPECT_FALSE(log.Open((path + L"-missing\\x.log").c_str()));
     log.LogText(L"first");
-    log.Close(); // harmless, also twice
-    log.Close();
+    log.Close(), log.Close();            // harmless, also twice
     ASSERT_TRUE(log.Open(path.c_str())); // appends
     log.LogText(L"second");
     ASSERT_TRUE(log.Open(path.c_str())); // drains the old worker into the file first
     log.LogText(L"third");
     for (int i = 0; i < 100 && ParseFile(path).size() < expected.size(); ++i) // the worker wakes by itself
         ::Sleep(50);
-    const unsigned long long after = logtest::NowKey();
-    ASSERT_TRUE(expected == ParseFile(path, before, after));
+    ASSERT_TRUE(expected == ParseFile(path, before, now()));
     // A lock on the region after the end makes the worker's next write fail, as a failing disk would.
     const HANDLE h = ::CreateFileW(path.c_str(), GENERIC_READ, FILE_SHARE_READ | FILE_SHARE_WRITE, NULL,
                                    OPEN_EXISTING, 0, NULL);
@@ -64,8 +69,7 @@ TEST(CLogFileTest, BlocksRoundTripOpenAppendsAndAFailedWriteLosesOnlyItsBlock)
     ASSERT_TRUE(::LockFileEx(h, LOCKFILE_EXCLUSIVE_LOCK | LOCKFILE_FAIL_IMMEDIATELY, 0, 1 << 20, 0, &at));
     log.LogText(L"lost");
     ::Sleep(1000); // several passes of the worker
-    ::UnlockFileEx(h, 0, 1 << 20, 0, &at);
-    ::CloseHandle(h);
+    ::UnlockFileEx(h, 0, 1 << 20, 0, &at), ::CloseHandle(h);
     log.LogText(L"after");
     log.Close();
     // Wine keeps byte-range locks but does not check them on writes, so there the block gets through.

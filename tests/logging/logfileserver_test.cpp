@@ -2,26 +2,27 @@
 #include <ostrand/logging/LogFileServer.h>
 #include <atomic>
 #include <cstring>
+#include <memory>
 #include <thread>
 
 using namespace ostrand;
 using logtest::Strings;
 
-class CLogFileServerTest : public ::testing::Test
+TEST(CLogFileServerTest, DetailPendingOperationsTwoHandlesAndConcurrentProducers)
 {
-protected:
-    CLogFileServerTest() { server.SetDetail(CLogFileServer::DetailFull); }
-    ~CLogFileServerTest() override
-    {
-        for (unsigned __int64 h = ch; h < ch + 10; ++h)
-            server.CloseLogFile(h);
+    CLogFileServer& server = CLogFileServer::Ref();
+    const unsigned __int64 ch = 0x7000000000000000ull;
+    const std::wstring folder = logtest::DebugFolder(),
+                       prefix = L"srv-" + std::to_wstring(::GetCurrentProcessId()) + L"-";
+    const std::shared_ptr<void> cleanup(nullptr, [&, saved = server.GetDetail()](void*) { // every way out
+        for (unsigned __int64 c = ch; c < ch + 10; ++c)
+            server.CloseLogFile(c);
         server.SetDetail(saved);
         for (const std::wstring& name : logtest::FindFiles(folder + prefix + L"*"))
             ::DeleteFileW((folder + name).c_str());
-    }
-    std::wstring Prefix(int i) const { return prefix + std::to_wstring(i); }
-    // The blocks of the one log file made with prefix `i`, whose name must follow the pattern.
-    Strings Logged(int i) const
+    });
+    const auto Prefix = [&](int i) { return prefix + std::to_wstring(i); };
+    const auto Logged = [&](int i) // the blocks of the one log file made with prefix `i`, its name checked
     {
         static const std::wregex name(L"-[0-9]{4}(\\.[0-9]{2}){2}-[0-9]{2}(\\.[0-9]{2}){2}\\.[0-9]{3}\\.log");
         const std::vector<std::wstring> files = logtest::FindFiles(folder + Prefix(i) + L"-*");
@@ -29,60 +30,42 @@ protected:
             return ADD_FAILURE() << files.size() << " files", Strings();
         EXPECT_TRUE(std::regex_match(files[0].substr(Prefix(i).size()), name)) << files[0];
         return logtest::ParseFile(folder + files[0]);
-    }
-
-    CLogFileServer& server = CLogFileServer::Ref();
-    const CLogFileServer::LogFileDetail saved = server.GetDetail();
-    const unsigned __int64 ch = 0x7000000000000000ull;
-    const std::wstring folder = logtest::DebugFolder(),
-                       prefix = L"srv-" + std::to_wstring(::GetCurrentProcessId()) + L"-";
-};
-
-TEST_F(CLogFileServerTest, DetailPendingOperationsTwoHandlesAndConcurrentProducers)
-{
+    };
     const unsigned __int64 h = ch, none = ch + 1, second = ch + 2;
     OVERLAPPED read = {}, write = {}, wait = {}, twice = {}, unknown = {};
     unsigned long mask = 0x81;
     char buffer[8] = {};
-    server.SetDetail(CLogFileServer::DetailNone);
-    EXPECT_FALSE(server.CreateLogFile(none, Prefix(1).c_str()));
-    EXPECT_FALSE(server.LogSentData(none, "x", 1, true)); // no log file: a no-op
+    server.SetDetail(CLogFileServer::DetailNone); // no log file: a no-op
+    EXPECT_FALSE(server.CreateLogFile(none, Prefix(1).c_str()) || server.LogSentData(none, "x", 1, true));
     server.SetDetail(CLogFileServer::DetailNormal);
     ASSERT_TRUE(server.CreateLogFile(h, Prefix(0).c_str()));
-    EXPECT_FALSE(server.LogText(h, false, L"unimportant"));
-    EXPECT_TRUE(server.LogText(h, true, L"important %d", 1));
-    EXPECT_TRUE(server.LogSentData(h, "A", 1, true));
+    EXPECT_TRUE(!server.LogText(h, false, L"unimportant") && server.LogText(h, true, L"important %d", 1) &&
+                server.LogSentData(h, "A", 1, true));
     server.AddPendingWaitOperation(h, &mask, &wait);
     EXPECT_TRUE(server.CommitPendingOperation(&wait, 4)); // removed, not logged
     server.SetDetail(CLogFileServer::DetailNone);         // the file stays, nothing reaches it
-    EXPECT_FALSE(server.LogReceivedData(h, "B", 1, true));
-    EXPECT_FALSE(server.LogText(h, true, L"dropped"));
+    EXPECT_FALSE(server.LogReceivedData(h, "B", 1, true) || server.LogText(h, true, L"dropped"));
     server.SetDetail(CLogFileServer::DetailFull);
     EXPECT_TRUE(server.LogText(h, false, L"full"));
     server.AddPendingWaitOperation(h, &mask, &wait);
     mask = 0x84; // the mask is read when the wait completes
-    EXPECT_TRUE(server.CommitPendingOperation(&wait, 4));
-    EXPECT_FALSE(server.CommitPendingOperation(&unknown, 4));
+    EXPECT_TRUE(server.CommitPendingOperation(&wait, 4) && !server.CommitPendingOperation(&unknown, 4));
     server.AddPendingReadOperation(h, buffer, sizeof(buffer), &read);
-    std::memcpy(buffer, "12345678", 8);                     // the read fills the buffer later
-    EXPECT_TRUE(server.CommitPendingOperation(&read, 100)); // more than the buffer: the buffer's size
-    EXPECT_FALSE(server.CommitPendingOperation(&read, 1));  // already committed
+    std::memcpy(buffer, "12345678", 8); // the read fills the buffer later; more than its size: its size
+    EXPECT_TRUE(server.CommitPendingOperation(&read, 100) && !server.CommitPendingOperation(&read, 1));
     server.AddPendingWriteOperation(h, "WXYZ", 4, &write);
-    EXPECT_TRUE(server.CommitPendingOperation(&write, 3));
     server.AddPendingReadOperation(h, buffer, sizeof(buffer), &twice); // replaced by the next one
     server.AddPendingWriteOperation(h, "abcd", 4, &twice);
-    EXPECT_TRUE(server.CommitPendingOperation(&twice, 4));
+    EXPECT_TRUE(server.CommitPendingOperation(&write, 3) && server.CommitPendingOperation(&twice, 4));
     EXPECT_FALSE(server.Attach(second, none)); // no log file to share
     ASSERT_TRUE(server.Attach(second, h));
-    server.AddPendingWriteOperation(h, "lost", 4, &write); // removed by CloseLogFile ...
-    EXPECT_TRUE(server.CloseLogFile(h));
-    EXPECT_FALSE(server.CommitPendingOperation(&write, 4));
-    EXPECT_TRUE(server.LogText(second, true, L"from second")); // the other handle keeps the file open
-    EXPECT_TRUE(server.CloseLogFile(second));
-    ASSERT_TRUE(server.CreateLogFile(h, Prefix(1).c_str())); // ... also when the channel logs again
-    EXPECT_FALSE(server.CommitPendingOperation(&write, 4));
-    EXPECT_TRUE(server.CloseLogFile(h));
-    EXPECT_TRUE(Logged(1).empty());
+    // CloseLogFile drops the channel's pending operations (also once it logs again); the other handle logs
+    // on.
+    server.AddPendingWriteOperation(h, "lost", 4, &write);
+    EXPECT_TRUE(server.CloseLogFile(h) && !server.CommitPendingOperation(&write, 4));
+    EXPECT_TRUE(server.LogText(second, true, L"from second") && server.CloseLogFile(second));
+    ASSERT_TRUE(server.CreateLogFile(h, Prefix(1).c_str()));
+    EXPECT_TRUE(!server.CommitPendingOperation(&write, 4) && server.CloseLogFile(h) && Logged(1).empty());
     EXPECT_EQ((Strings{"important 1", "sent A", "full",
                        "ASYNC WaitCommEvent(LPDWORD lpEvtMask) succeeded. *lpEvtMask=0x84.",
                        "received 12345678 async", "sent WXY async", "sent abcd async", "from second"}),
