@@ -1,5 +1,4 @@
-// An independent reader of communication log files (it knows the format only from its description and
-// shares no code with the library), and the Win32 file helpers of the logging tests.
+// A reader of communication log files that shares no code with the library, and the tests' file helpers.
 #pragma once
 
 #include <ostrand/platform.h>
@@ -17,10 +16,10 @@ using Strings = std::vector<std::string>;
 // ASYNC. A part that breaks the format, or a time stamp (yyyymmddhhmmssmmm) outside from..to, fails the test.
 inline Strings ParseFile(const std::wstring& path, unsigned long long from = 0, unsigned long long to = ~0ull)
 {
-    static const std::regex header("(?:Text Event|(A?SYNC) (WRITE|READ) request completed: (0|[1-9][0-9]*) "
-                                   "\\(0x(0|[1-9A-F][0-9A-F]*)\\) bytes), ([0-9]{4})/([1-9]|1[0-2])/"
-                                   "([1-9]|[12][0-9]|3[01]), ([01][0-9]|2[0-3]):([0-5][0-9]):"
-                                   "([0-5][0-9])\\.([0-9]{3})");
+    // clang-format off
+    static const std::regex header("(?:Text Event|(A?SYNC) (WRITE|READ) request completed: (0|[1-9][0-9]*) \\(0x(0|[1-9A-F][0-9A-F]*)\\) bytes), "
+                                   "([0-9]{4})/([1-9]|1[0-2])/([1-9]|[12][0-9]|3[01]), ([01][0-9]|2[0-3]):([0-5][0-9]):([0-5][0-9])\\.([0-9]{3})");
+    // clang-format on
     std::ifstream in(path.c_str(), std::ios::binary); // _wfopen shares reading and writing
     const std::string f{std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
     Strings lines, blocks;

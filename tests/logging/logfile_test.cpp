@@ -4,8 +4,7 @@
 using namespace ostrand;
 using logtest::ParseFile;
 
-// Data and texts round trip with their times; then entries logged while closed wait for Open, Open
-// appends, and a write that fails loses only its block.
+// Data and texts round trip with their times; entries logged while closed wait for Open, which appends.
 TEST(CLogFileTest, BlocksRoundTripOpenAppendsAndAFailedWriteLosesOnlyItsBlock)
 {
     const auto now = []

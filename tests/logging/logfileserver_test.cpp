@@ -70,7 +70,6 @@ TEST(CLogFileServerTest, DetailPendingOperationsTwoHandlesAndConcurrentProducers
                        "ASYNC WaitCommEvent(LPDWORD lpEvtMask) succeeded. *lpEvtMask=0x84.",
                        "received 12345678 async", "sent WXY async", "sent abcd async", "from second"}),
               Logged(0));
-
     // Concurrency: entry i of thread t is "<t:i>" as a text, as sent SYNC or as received ASYNC, by i % 3.
     const int kThreads = 8, kChannels = 4, kEntries = 20000;
     const char* const kinds[][2] = {{"", ""}, {"sent ", ""}, {"received ", " async"}};
