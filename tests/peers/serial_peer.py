@@ -18,8 +18,7 @@ class Peer:
         self.record = open(args.record or os.path.join(args.dir, "received"), "ab", buffering=0)
         self.pending, self.outgoing, self.echo, self.busy, self.stopping = bytearray(), bytearray(), False, None, None
         self.master, self.slave = os.openpty()  # holding the slave keeps the line up while the port reopens
-        tty.setraw(self.slave)
-        os.set_blocking(self.master, False)
+        tty.setraw(self.slave), os.set_blocking(self.master, False)
         self.slave_name, self.link = os.ttyname(self.slave), os.path.join(args.prefix, "dosdevices", args.port.lower())
         os.symlink(self.slave_name, "%s.%d" % (self.link, os.getpid()))
         os.replace("%s.%d" % (self.link, os.getpid()), self.link)
@@ -52,10 +51,8 @@ class Peer:
         for name, *args in commands:
             self.busy = " ".join([name] + args)
             text = codecs.escape_decode(args[0].encode("latin-1"))[0] if args else b""
-            if name == "send":
-                self.outgoing += text
-            elif name == "burst":
-                self.outgoing += (bytes(range(251)) * (int(text) // 251 + 1))[: int(text)]
+            if name in ("send", "burst"):
+                self.outgoing += text if name == "send" else (bytes(range(251)) * (int(text) // 251 + 1))[: int(text)]
             elif name == "expect":
                 self.until(lambda: text in self.pending)
                 del self.pending[: self.pending.index(text) + len(text)]
@@ -76,22 +73,18 @@ class Peer:
 
 def main():
     parser = argparse.ArgumentParser(description=__doc__, formatter_class=argparse.RawTextHelpFormatter)
-    for name in ("--port", "--dir"):
-        parser.add_argument(name, required=True)
+    parser.add_argument("--port", required=True), parser.add_argument("--dir", required=True)
     parser.add_argument("--prefix", default=os.environ.get("WINEPREFIX") or os.path.expanduser("~/.wine"))
-    parser.add_argument("--record")
+    parser.add_argument("--record"), parser.add_argument("--timeout", type=float, default=30.0)
     parser.add_argument("-e", dest="commands", action="append", default=[])
-    parser.add_argument("--timeout", type=float, default=30.0)
     args = parser.parse_args()
     # Whoever started the peer may wait for the end of its output: keep that output in the work folder.
-    log = os.open(os.path.join(args.dir, "peer.log"), os.O_WRONLY | os.O_CREAT | os.O_APPEND, 0o644)
-    os.dup2(log, 1), os.dup2(log, 2)
-    peer = Peer(args)
+    os.dup2(os.open(os.path.join(args.dir, "peer.log"), os.O_WRONLY | os.O_CREAT | os.O_APPEND, 0o644), 1)
+    os.dup2(1, 2)
+    peer, failure = Peer(args), None
     signal.signal(signal.SIGTERM, lambda number, frame: setattr(peer, "stopping", time.monotonic()))
-    status = open(os.path.join(args.dir, "status"), "a", buffering=1)
-    status.write("READY %s\n" % peer.slave_name)
+    (status := open(os.path.join(args.dir, "status"), "a", buffering=1)).write("READY %s\n" % peer.slave_name)
     try:
-        failure = None
         peer.run([shlex.split(part) for part in ";".join(args.commands).split(";") if part.strip()])
     except Stop as stop:
         failure = stop.args[0]

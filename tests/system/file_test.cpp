@@ -5,19 +5,15 @@
 #include <functional>
 #include <string>
 #include <tuple>
-
 #include "system_test_util.h"
 
 using namespace ostrand;
 using u64 = unsigned __int64;
 
-namespace
-{
+// Each test gets a fresh temporary folder; a test that goes beyond MAX_PATH removes that part itself.
 class CFileTest : public ::testing::Test
 {
 protected:
-    // Each test gets a fresh folder under the system's temporary folder; a test that goes beyond MAX_PATH
-    // removes that part itself.
     CFileTest()
     {
         wchar_t temp[MAX_PATH + 1];
@@ -26,10 +22,9 @@ protected:
         std::filesystem::create_directory(m_temp);
     }
     void TearDown() override { std::filesystem::remove_all(m_temp); }
-
     std::wstring In(const std::wstring& name) const { return m_temp + L"\\" + name; }
 
-    // Creates or replaces the file, writes `bytes` and leaves it open in `file`.
+    // Creates or replaces the file with `bytes` and leaves it open in `file`.
     std::wstring Create(CFile& file, const std::wstring& name, const std::string& bytes = "")
     {
         const std::wstring path = name[0] == L'\\' ? name : In(name);
@@ -38,10 +33,8 @@ protected:
         EXPECT_TRUE(file.Write(bytes.data(), bytes.size(), n) && n == bytes.size());
         return path;
     }
-
     std::wstring m_temp;
 };
-} // namespace
 
 TEST_F(CFileTest, SetLengthBelowThePositionAndPositionsBeyondFourGiBOnASparseFile)
 {
@@ -49,16 +42,15 @@ TEST_F(CFileTest, SetLengthBelowThePositionAndPositionsBeyondFourGiBOnASparseFil
     const std::wstring path = Create(file, L"big.bin", "hello, file");
     EXPECT_EQ(1u, file.Seek(-10, FILE_CURRENT));
     EXPECT_EQ(6u, file.Seek(-5, FILE_END));
+    u64 n = 0;
+    char buffer[32] = {0};
     file.SetLength(4);
     EXPECT_EQ(4u, file.GetPosition());
-    u64 n = 0;
     EXPECT_TRUE(file.Write("yz", 2, n));
     file.SetLength(9);
     EXPECT_EQ(0u, file.Seek(0, FILE_BEGIN));
-    char buffer[32] = {0};
     EXPECT_TRUE(file.Read(buffer, sizeof buffer, n));
     EXPECT_EQ(std::string("hellyz\0\0\0", 9), std::string(buffer, n));
-
     DWORD returned = 0; // sparse where the file system allows it; on Wine the host file has a hole anyway
     ::DeviceIoControl(file.GetHandle(), FSCTL_SET_SPARSE, NULL, 0, NULL, 0, &returned, NULL);
     const __int64 four = 4ll << 30, distant = (5ll << 30) + 7;
@@ -81,11 +73,9 @@ TEST_F(CFileTest, SetLengthBelowThePositionAndPositionsBeyondFourGiBOnASparseFil
 
 TEST_F(CFileTest, FailuresCarryTheCallAndTheSystemError)
 {
-    CFile empty, readOnly, file;
-    Create(file, L"a.txt", "abc");
+    CFile empty, readOnly, file, other;
+    Create(file, L"a.txt", "abc"), Create(other, L"c.txt"), Create(other, L"b.txt"), other.Close();
     const std::wstring b = In(L"b.txt"), c = In(L"c.txt"), missing = In(L"missing.txt");
-    for (const std::wstring& path : {b, c})
-        CFile(path.c_str(), GENERIC_WRITE, 0, NULL, CREATE_NEW, 0).Close();
     readOnly.Open(b.c_str(), GENERIC_READ, 0, NULL, OPEN_EXISTING, 0);
     char buffer[4];
     u64 n = 0;
@@ -108,17 +98,14 @@ TEST_F(CFileTest, FailuresCarryTheCallAndTheSystemError)
         {ERROR_MOD_NOT_FOUND, L"GetModuleFileName", [&] { CFile::GetModuleFileNameW(HINSTANCE(ULONG_PTR(0x10000)), text, true); }},
         {ERROR_DIRECTORY, L"GetTempFileName", [&] { CFile::GetTempFileNameW(missing.c_str(), L"o", 0, name); }},
     };
+    for (const auto& [code, call, f] : rows) ExpectWin(f, code, call, L"File");
     // clang-format on
-    for (const auto& [code, call, f] : rows)
-        ExpectWin(f, code, call, L"File");
-    EXPECT_EQ(3u, file.GetPosition());
-    EXPECT_EQ(0u, CFile::GetLength(b.c_str()));
+    EXPECT_TRUE(file.GetPosition() == 3 && CFile::GetLength(b.c_str()) == 0);
     EXPECT_TRUE(!readOnly.IsCreated() &&
                 CFile(b.c_str(), GENERIC_READ, 0, NULL, OPEN_EXISTING, 0).IsCreated())
         << "the failing Open did not close the handle it replaced";
     EXPECT_TRUE(name.empty() && text.empty()) << "a failing name function left the old text";
-    CFile::Rename(c.c_str(), missing.c_str());
-    CFile::Remove(missing.c_str());
+    CFile::Rename(c.c_str(), missing.c_str()), CFile::Remove(missing.c_str());
     EXPECT_FALSE(CFile::FileExists(c.c_str()) || CFile::FileExists(missing.c_str()));
 }
 
@@ -127,16 +114,14 @@ TEST(CFileOverlappedTest, ReadOnAPipePendsUntilThePeerWrites)
 {
     const std::wstring name = L"\\\\.\\pipe\\ostrand-test-" + std::to_wstring(::GetCurrentProcessId());
     CFile server, client;
-    server.Attach(
-        ::CreateNamedPipeW(name.c_str(), PIPE_ACCESS_DUPLEX, PIPE_TYPE_BYTE, 1, 4096, 4096, 0, NULL));
+    server.Attach(::CreateNamedPipeW(name.c_str(), PIPE_ACCESS_DUPLEX, PIPE_TYPE_BYTE, 1, 4096, 4096, 0, 0));
     client.Open(name.c_str(), GENERIC_READ | GENERIC_WRITE, 0, NULL, OPEN_EXISTING, FILE_FLAG_OVERLAPPED);
     COverlapped ov(NULL, TRUE, FALSE, NULL);
     char buffer[16] = {0};
     u64 n = 0, written = 0;
     EXPECT_EQ(DWORD(ERROR_IO_PENDING), client.Read(buffer, sizeof buffer, n, &ov) ? 0 : ::GetLastError());
     EXPECT_EQ(DWORD(ERROR_IO_INCOMPLETE), client.GetOverlappedResult(&ov, n, FALSE) ? 0 : ::GetLastError());
-    EXPECT_TRUE(server.Write("12345", 5, written));
-    EXPECT_TRUE(client.GetOverlappedResult(&ov, n, TRUE));
+    EXPECT_TRUE(server.Write("12345", 5, written) && client.GetOverlappedResult(&ov, n, TRUE));
     EXPECT_EQ("12345", std::string(buffer, n));
 }
 
@@ -149,8 +134,7 @@ TEST_F(CFileTest, FileExistsAndGetLengthNeverThrowAndNamesAreWhole)
     while (deep.size() <= 300)
         ::CreateDirectoryW((deep += L"\\" + std::wstring(50, L'd')).c_str(), NULL);
     const std::wstring huge = In(std::wstring(40000, L'n'));
-    Create(file, deep + L"\\long.bin", "123");
-    file.Close();
+    Create(file, deep + L"\\long.bin", "123"), file.Close();
     // clang-format off
     const std::tuple<std::wstring, bool, bool, u64> rows[] = {
         {In(L"A1.TXT"), true, false, 7}, {m_temp + L"/a1.txt", true, false, 7}, {In(L"sub.d"), true, true, 0},
@@ -168,8 +152,8 @@ TEST_F(CFileTest, FileExistsAndGetLengthNeverThrowAndNamesAreWhole)
         EXPECT_EQ(length, CFile::GetLength(path.c_str()));
     }
     bool isFolder = true;
-    EXPECT_FALSE(CFile::FileExists(NULL, isFolder) || isFolder || CFile::FileExists(NULL));
-    EXPECT_EQ(~0ull, CFile::GetLength(static_cast<const wchar_t*>(NULL)));
+    EXPECT_FALSE(CFile::FileExists(NULL, isFolder) || isFolder || CFile::FileExists(NULL) ||
+                 CFile::GetLength(static_cast<const wchar_t*>(NULL)) != ~0ull);
     EXPECT_TRUE(CFile::FileExists(CSIDL_SYSTEM, L"kernel32", L".dll", isFolder) && !isFolder);
     EXPECT_NE(~0ull, CFile::GetLength(CSIDL_SYSTEM, L"kernel32", L"dll"));
     EXPECT_FALSE(CFile::FileExists(0xFF, L"kernel32", L"dll", isFolder) || isFolder);
@@ -177,20 +161,18 @@ TEST_F(CFileTest, FileExistsAndGetLengthNeverThrowAndNamesAreWhole)
 
     wchar_t raw[MAX_PATH + 1];
     ustring full, name, drive, dir, fname, ext;
-    CFile::GetTempPathW(full);
-    EXPECT_EQ(ustring(raw, ::GetTempPathW(MAX_PATH + 1, raw)), full);
+    EXPECT_EQ(ustring(raw, ::GetTempPathW(MAX_PATH + 1, raw)), (CFile::GetTempPathW(full), full));
     CFile::GetModuleFileNameW(NULL, full, true);
     CFile::SplitPath(full.c_str(), drive, dir, fname, ext);
     ASSERT_TRUE(::CopyFileW((drive + dir + ustring(L"ostrand_tiny_module.dll")).c_str(),
                             (deep + L"\\tiny.module.dll").c_str(), FALSE));
     HMODULE module = ::LoadLibraryW((deep + L"\\tiny.module.dll").c_str());
     ASSERT_NE(HMODULE(NULL), module) << ::GetLastError();
-    CFile::GetModuleFileNameW(module, full, true);
-    CFile::GetModuleFileNameW(module, name, false);
+    CFile::GetModuleFileNameW(module, full, true), CFile::GetModuleFileNameW(module, name, false);
     ::FreeLibrary(module);
     EXPECT_GT(full.size(), 300u);
-    EXPECT_EQ(ustring(L"\\tiny.module.dll"), full.substr(full.size() - 16)) << full.c_str();
-    EXPECT_EQ(ustring(L"tiny.module"), name);
+    EXPECT_EQ(std::wstring(L"\\tiny.module.dll|tiny.module"),
+              full.substr(full.size() - 16) + L"|" + name.c_str());
     for (::DeleteFileW((deep + L"\\long.bin").c_str()), ::DeleteFileW((deep + L"\\tiny.module.dll").c_str());
          deep.size() > m_temp.size() + 4; deep.resize(deep.rfind(L'\\')))
         ::RemoveDirectoryW(deep.c_str());

@@ -4,18 +4,14 @@
 #include <atomic>
 #include <string>
 #include <thread>
-
 #include "system_test_util.h"
 
 using namespace ostrand;
 
-namespace
-{
 // No handle table of the test process hands this value out, so closing it fails with 6.
-const HANDLE kBogus = reinterpret_cast<HANDLE>(static_cast<ULONG_PTR>(0x7FFFFF00));
-const auto IsSignalled = [](HANDLE h) { return ::WaitForSingleObject(h, 0) == WAIT_OBJECT_0; };
-const auto IsOpen = [](HANDLE h) { return ::WaitForSingleObject(h, 0) != WAIT_FAILED; };
-} // namespace
+static const HANDLE kBogus = reinterpret_cast<HANDLE>(static_cast<ULONG_PTR>(0x7FFFFF00));
+static const auto IsSignalled = [](HANDLE h) { return ::WaitForSingleObject(h, 0) == WAIT_OBJECT_0; };
+static const auto IsOpen = [](HANDLE h) { return ::WaitForSingleObject(h, 0) != WAIT_FAILED; };
 
 TEST(CHandleTest, OwnershipRulesHoldEvenWhenCloseFailsAndNamedEventsAreShared)
 {
@@ -24,8 +20,7 @@ TEST(CHandleTest, OwnershipRulesHoldEvenWhenCloseFailsAndNamedEventsAreShared)
         CEvent event;
         const HANDLE owned = event.GetHandle();
         EXPECT_FALSE(event.Attach(kBogus));
-        EXPECT_EQ(owned, detached = event.Detach());
-        EXPECT_FALSE(event.IsCreated());
+        EXPECT_TRUE(owned == (detached = event.Detach()) && !event.IsCreated());
     }
     EXPECT_TRUE(IsOpen(detached)) << "the destructor closed a detached handle";
     CHandle handle(NULL);
@@ -47,8 +42,7 @@ TEST(CHandleTest, OwnershipRulesHoldEvenWhenCloseFailsAndNamedEventsAreShared)
     EXPECT_TRUE(IsSignalled(created.GetHandle()));
     ExpectWin([] { CEvent e(SYNCHRONIZE, FALSE, L"ostrand-test-no-such-event"); }, ERROR_FILE_NOT_FOUND,
               L"OpenEventW", L"Object");
-    created.Close();
-    ExpectWin([&] { created.Set(); }, ERROR_INVALID_HANDLE, L"SetEvent", L"Object");
+    ExpectWin([&] { created.Close(), created.Set(); }, ERROR_INVALID_HANDLE, L"SetEvent", L"Object");
     ExpectWin([&] { created.Reset(); }, ERROR_INVALID_HANDLE, L"ResetEvent", L"Object");
 }
 
@@ -65,29 +59,22 @@ TEST(CLockTest, ZeroTimeoutFailsAtOnceWhileAnotherThreadOwnsTheLockWhichRecurses
             owned = mutex.Lock(INFINITE) && cs.Lock(false);
             held.Set();
             ::WaitForSingleObject(release.GetHandle(), INFINITE);
-            mutex.Unlock();
-            cs.Unlock();
-            cs.Unlock();
+            mutex.Unlock(), cs.Unlock(), cs.Unlock();
         });
-    EXPECT_EQ(WAIT_OBJECT_0, ::WaitForSingleObject(held.GetHandle(), 10000));
-    EXPECT_TRUE(owned.load());
+    EXPECT_TRUE(::WaitForSingleObject(held.GetHandle(), 10000) == WAIT_OBJECT_0 && owned.load());
     const DWORD start = ::GetTickCount();
     EXPECT_FALSE(mutex.Lock(0) || cs.Lock(false));
     EXPECT_LT(::GetTickCount() - start, 1000u);
-    release.Set();
-    owner.join();
+    release.Set(), owner.join();
     EXPECT_TRUE(cs.Lock(false)) << "the owner's two levels did not both end";
     cs.Unlock();
     EXPECT_TRUE(mutex.Lock(0) && mutex.Lock(0));
-    mutex.Unlock();
-    mutex.Unlock();
+    mutex.Unlock(), mutex.Unlock();
     ExpectWin([&] { mutex.Unlock(); }, ERROR_NOT_OWNER, L"ReleaseMutex", L"Object");
-
     std::thread([&] { EXPECT_TRUE(mutex.Lock(INFINITE)); }).join(); // ends without Unlock
     EXPECT_TRUE(mutex.Lock(0)) << "an abandoned mutex counts as acquired";
     EXPECT_NO_THROW(mutex.Unlock()) << "Lock reported an abandoned mutex as acquired but it is not ours";
-    mutex.Close();
-    ExpectWin([&] { mutex.Lock(0); }, ERROR_INVALID_HANDLE, L"WaitForSingleObject", L"Object");
+    ExpectWin([&] { mutex.Close(), mutex.Lock(0); }, ERROR_INVALID_HANDLE, L"WaitForSingleObject", L"Object");
 }
 
 TEST(COverlappedTest, EventsResetAsAskedAndDieWithTheirRecord)
@@ -99,21 +86,17 @@ TEST(COverlappedTest, EventsResetAsAskedAndDieWithTheirRecord)
         COverlapped ov, manual(NULL, TRUE, TRUE, NULL);
         CWSAOverlapped wsa;
         h = ov.hEvent;
-        ov.SetEvent();
-        wsa.SetEvent();
+        ov.SetEvent(), wsa.SetEvent();
         EXPECT_TRUE(IsSignalled(h) && !IsSignalled(h));
         EXPECT_TRUE(IsSignalled(manual.hEvent) && IsSignalled(wsa.hEvent) && IsSignalled(wsa.hEvent));
         EXPECT_EQ(0u, ov.Internal + ov.InternalHigh + ov.Offset + ov.OffsetHigh + wsa.Internal +
                           wsa.InternalHigh + wsa.Offset + wsa.OffsetHigh);
-        manual.ResetEvent();
-        wsa.ResetEvent();
+        manual.ResetEvent(), wsa.ResetEvent();
         EXPECT_FALSE(IsSignalled(manual.hEvent) || IsSignalled(wsa.hEvent));
     }
     EXPECT_FALSE(IsOpen(h));
-
     CWSAEvent event;
-    h = event.GetHandle();
-    event.Close();
+    h = event.GetHandle(), event.Close();
     EXPECT_FALSE(event.IsCreated() || IsOpen(h));
     ExpectWin([&] { event.Set(); }, ERROR_INVALID_HANDLE, L"SetEvent", L"Object");
     EXPECT_TRUE(event.Attach(kBogus));
