@@ -47,24 +47,21 @@ inline Strings ParseFile(const std::wstring& path, unsigned long long from = 0, 
         }
         else
         {
-            // A dump line: a space, 32 cells of "XX " (upper case) or of three spaces after the data, four
-            // spaces, then each byte as itself when 0x21..0x7E, else '.'; rebuilt from the bytes of the hex
-            // column.
+            // Dump lines, rebuilt from the hex column: a space, 32 cells of "XX " (upper case) or of three
+            // spaces after the data, four spaces, then each byte as itself when 0x21..0x7E, else '.'.
             for (std::string s; ++l < lines.size() && !(s = lines[l]).empty();)
             {
                 size_t n = 0, full = block.size() % 32 == 0; // only a block's last line may be short
                 while (n < 32 && 3 * n + 3 < s.size() && s[3 * n + 1] != ' ')
                     block.push_back(char(std::stoul(s.substr(3 * n++ + 1, 2), nullptr, 16)));
-                std::string expected = " ", text;
-                for (size_t i = 0; i < 32; ++i)
+                std::string cells = " ", text;
+                for (size_t i = block.size() - n; i < block.size(); ++i)
                 {
-                    const unsigned char b = i < n ? block[block.size() - n + i] : 0;
-                    expected += i < n
-                                    ? std::string{"0123456789ABCDEF"[b >> 4], "0123456789ABCDEF"[b & 15], ' '}
-                                    : "   ";
-                    text += i >= n ? "" : b > 0x20 && b < 0x7F ? std::string(1, char(b)) : ".";
+                    const unsigned char b = block[i];
+                    cells += {"0123456789ABCDEF"[b >> 4], "0123456789ABCDEF"[b & 15], ' '};
+                    text += b > 0x20 && b < 0x7F ? char(b) : '.';
                 }
-                if (!full || n == 0 || s != expected + "    " + text)
+                if (!full || n == 0 || s != cells + std::string(3 * (32 - n) + 4, ' ') + text)
                     return fail("bad dump line");
             }
             if (std::to_string(block.size()) != m[3] || std::stoul(m[4].str(), nullptr, 16) != block.size())
