@@ -67,8 +67,10 @@ TEST(CLogFileTest, BlocksRoundTripOpenAppendsAndAFailedWriteLosesOnlyItsBlock)
     OVERLAPPED at = {0, 0, {{::GetFileSize(h, NULL), 0}}, NULL};
     ASSERT_TRUE(::LockFileEx(h, LOCKFILE_EXCLUSIVE_LOCK | LOCKFILE_FAIL_IMMEDIATELY, 0, 1 << 20, 0, &at));
     log.LogText(L"lost"), ::Sleep(1000); // several passes of the worker
-    ::UnlockFileEx(h, 0, 1 << 20, 0, &at), ::CloseHandle(h);
-    log.LogText(L"after"), log.Close();
+    ::UnlockFileEx(h, 0, 1 << 20, 0, &at);
+    ::CloseHandle(h);
+    log.LogText(L"after");
+    log.Close();
     // Wine keeps byte-range locks but does not check them on writes, so there the block gets through.
     if (::GetProcAddress(::GetModuleHandleW(L"ntdll.dll"), "wine_get_version") != NULL)
         expected.push_back("lost");

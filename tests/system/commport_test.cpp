@@ -11,7 +11,8 @@ TEST_F(CCommPortTest, OpensReopensRoundTripsTheConfigurationAndReportsAMissingPo
 {
     CCommPort& port = Connect("expect ONE; expect TWO");
     WriteText("ONE");
-    port.Close(), port.Open(kPort, 0);
+    port.Close();
+    port.Open(kPort, 0);
     const HANDLE first = port.GetHandle();
     port.Open(kPort, 0);
     DWORD value = 0; // the old handle was closed: either its value was reused or it is gone
@@ -22,7 +23,8 @@ TEST_F(CCommPortTest, OpensReopensRoundTripsTheConfigurationAndReportsAMissingPo
     DCB dcb = {}, back = {};
     port.GetCommState(dcb);
     ASSERT_TRUE(::BuildCommDCBW(L"baud=19200 parity=E data=7 stop=2 xon=on octs=on", &dcb));
-    port.SetCommState(dcb), port.GetCommState(back);
+    port.SetCommState(dcb);
+    port.GetCommState(back);
     EXPECT_EQ(19200u, back.BaudRate);
     EXPECT_EQ(3u * 256 + TWOSTOPBITS, (back.fOutX + back.fInX + back.fOutxCtsFlow) * 256 + back.StopBits);
     // A Linux pseudo-terminal clears the size and parity bits of its termios: Wine reads back 8N.
@@ -31,9 +33,11 @@ TEST_F(CCommPortTest, OpensReopensRoundTripsTheConfigurationAndReportsAMissingPo
     dcb.ByteSize = 3;
     ExpectWin([&] { port.SetCommState(dcb); }, ERROR_NOT_SUPPORTED, L"SetCommState", L"CommPort");
     COMMTIMEOUTS timeouts = {50, 3, 700, 11, 900}, timeoutsBack = {};
-    port.SetCommTimeouts(timeouts), port.GetCommTimeouts(timeoutsBack);
+    port.SetCommTimeouts(timeouts);
+    port.GetCommTimeouts(timeoutsBack);
     EXPECT_EQ(0, std::memcmp(&timeouts, &timeoutsBack, sizeof(timeouts)));
-    port.SetCommMask(EV_RXCHAR | EV_ERR), port.GetCommMask(value);
+    port.SetCommMask(EV_RXCHAR | EV_ERR);
+    port.GetCommMask(value);
     EXPECT_EQ(static_cast<DWORD>(EV_RXCHAR | EV_ERR), value);
     EXPECT_EQ("ok", StopPeer());
     EXPECT_EQ("ONETWO", Read(L"received"));
@@ -65,7 +69,8 @@ TEST_F(CCommPortTest, SynchronousReadsWithTimeoutsAMegabyteBothWaysPurgeAndContr
     WriteText(sent);
     EXPECT_TRUE(ReadText(sent.size()) == sent);
     port.SetCommTimeouts({0, 0, 300, 0, 10000});
-    port.EscapeCommFunction(SETBREAK), port.ClearCommBreak();
+    port.EscapeCommFunction(SETBREAK);
+    port.ClearCommBreak();
     // A pseudo-terminal has no modem lines: Wine fails SETDTR there, where a real port on Windows succeeds.
     ExpectWin([&] { port.EscapeCommFunction(SETDTR); }, ERROR_NOT_SUPPORTED, L"EscapeCommFunction",
               L"CommPort");

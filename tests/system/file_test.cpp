@@ -66,7 +66,8 @@ TEST_F(CFileTest, SetLengthBelowThePositionAndPositionsBeyondFourGiBOnASparseFil
     {
         EXPECT_EQ(at, (::SetLastError(ERROR_ACCESS_DENIED), file.Seek(static_cast<__int64>(at), FILE_BEGIN)));
         EXPECT_EQ(at, (::SetLastError(ERROR_ACCESS_DENIED), file.GetPosition()));
-        ::SetLastError(ERROR_ACCESS_DENIED), file.SetLength(at);
+        ::SetLastError(ERROR_ACCESS_DENIED);
+        file.SetLength(at);
         EXPECT_EQ(at, (::SetLastError(ERROR_ACCESS_DENIED), file.GetLength()));
     }
 }
@@ -74,7 +75,10 @@ TEST_F(CFileTest, SetLengthBelowThePositionAndPositionsBeyondFourGiBOnASparseFil
 TEST_F(CFileTest, FailuresCarryTheCallAndTheSystemError)
 {
     CFile empty, readOnly, file, other;
-    Create(file, L"a.txt", "abc"), Create(other, L"c.txt"), Create(other, L"b.txt"), other.Close();
+    Create(file, L"a.txt", "abc");
+    Create(other, L"c.txt");
+    Create(other, L"b.txt");
+    other.Close();
     const std::wstring b = In(L"b.txt"), c = In(L"c.txt"), missing = In(L"missing.txt");
     readOnly.Open(b.c_str(), GENERIC_READ, 0, NULL, OPEN_EXISTING, 0);
     char buffer[4];
@@ -105,7 +109,8 @@ TEST_F(CFileTest, FailuresCarryTheCallAndTheSystemError)
                 CFile(b.c_str(), GENERIC_READ, 0, NULL, OPEN_EXISTING, 0).IsCreated())
         << "the failing Open did not close the handle it replaced";
     EXPECT_TRUE(name.empty() && text.empty()) << "a failing name function left the old text";
-    CFile::Rename(c.c_str(), missing.c_str()), CFile::Remove(missing.c_str());
+    CFile::Rename(c.c_str(), missing.c_str());
+    CFile::Remove(missing.c_str());
     EXPECT_FALSE(CFile::FileExists(c.c_str()) || CFile::FileExists(missing.c_str()));
 }
 
@@ -134,7 +139,8 @@ TEST_F(CFileTest, FileExistsAndGetLengthNeverThrowAndNamesAreWhole)
     while (deep.size() <= 300)
         ::CreateDirectoryW((deep += L"\\" + std::wstring(50, L'd')).c_str(), NULL);
     const std::wstring huge = In(std::wstring(40000, L'n'));
-    Create(file, deep + L"\\long.bin", "123"), file.Close();
+    Create(file, deep + L"\\long.bin", "123");
+    file.Close();
     // clang-format off
     const std::tuple<std::wstring, bool, bool, u64> rows[] = {
         {In(L"A1.TXT"), true, false, 7}, {m_temp + L"/a1.txt", true, false, 7}, {In(L"sub.d"), true, true, 0},
@@ -168,7 +174,8 @@ TEST_F(CFileTest, FileExistsAndGetLengthNeverThrowAndNamesAreWhole)
                             (deep + L"\\tiny.module.dll").c_str(), FALSE));
     HMODULE module = ::LoadLibraryW((deep + L"\\tiny.module.dll").c_str());
     ASSERT_NE(HMODULE(NULL), module) << ::GetLastError();
-    CFile::GetModuleFileNameW(module, full, true), CFile::GetModuleFileNameW(module, name, false);
+    CFile::GetModuleFileNameW(module, full, true);
+    CFile::GetModuleFileNameW(module, name, false);
     ::FreeLibrary(module);
     EXPECT_GT(full.size(), 300u);
     EXPECT_EQ(std::wstring(L"\\tiny.module.dll|tiny.module"),

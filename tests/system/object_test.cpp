@@ -59,17 +59,21 @@ TEST(CLockTest, ZeroTimeoutFailsAtOnceWhileAnotherThreadOwnsTheLockWhichRecurses
             owned = mutex.Lock(INFINITE) && cs.Lock(false);
             held.Set();
             ::WaitForSingleObject(release.GetHandle(), INFINITE);
-            mutex.Unlock(), cs.Unlock(), cs.Unlock();
+            mutex.Unlock();
+            cs.Unlock();
+            cs.Unlock();
         });
     EXPECT_TRUE(::WaitForSingleObject(held.GetHandle(), 10000) == WAIT_OBJECT_0 && owned.load());
     const DWORD start = ::GetTickCount();
     EXPECT_FALSE(mutex.Lock(0) || cs.Lock(false));
     EXPECT_LT(::GetTickCount() - start, 1000u);
-    release.Set(), owner.join();
+    release.Set();
+    owner.join();
     EXPECT_TRUE(cs.Lock(false)) << "the owner's two levels did not both end";
     cs.Unlock();
     EXPECT_TRUE(mutex.Lock(0) && mutex.Lock(0));
-    mutex.Unlock(), mutex.Unlock();
+    mutex.Unlock();
+    mutex.Unlock();
     ExpectWin([&] { mutex.Unlock(); }, ERROR_NOT_OWNER, L"ReleaseMutex", L"Object");
     std::thread([&] { EXPECT_TRUE(mutex.Lock(INFINITE)); }).join(); // ends without Unlock
     EXPECT_TRUE(mutex.Lock(0)) << "an abandoned mutex counts as acquired";
@@ -86,12 +90,14 @@ TEST(COverlappedTest, EventsResetAsAskedAndDieWithTheirRecord)
         COverlapped ov, manual(NULL, TRUE, TRUE, NULL);
         CWSAOverlapped wsa;
         h = ov.hEvent;
-        ov.SetEvent(), wsa.SetEvent();
+        ov.SetEvent();
+        wsa.SetEvent();
         EXPECT_TRUE(IsSignalled(h) && !IsSignalled(h));
         EXPECT_TRUE(IsSignalled(manual.hEvent) && IsSignalled(wsa.hEvent) && IsSignalled(wsa.hEvent));
         EXPECT_EQ(0u, ov.Internal + ov.InternalHigh + ov.Offset + ov.OffsetHigh + wsa.Internal +
                           wsa.InternalHigh + wsa.Offset + wsa.OffsetHigh);
-        manual.ResetEvent(), wsa.ResetEvent();
+        manual.ResetEvent();
+        wsa.ResetEvent();
         EXPECT_FALSE(IsSignalled(manual.hEvent) || IsSignalled(wsa.hEvent));
     }
     EXPECT_FALSE(IsOpen(h));

@@ -182,7 +182,9 @@ TEST_F(SocketTest, SelectPollsTimesOutBlocksAndEventsSignal)
 {
     CWSASocket server(AcceptPeer(300, L"x"));
     fd_set r, w, e;
-    FD_ZERO(&r), FD_ZERO(&w), FD_ZERO(&e);
+    FD_ZERO(&r);
+    FD_ZERO(&w);
+    FD_ZERO(&e);
     FD_SET(static_cast<SOCKET>(server), &r);
     EXPECT_EQ(0, CWSASocket::Select(r, w, e, 0));
 

@@ -109,7 +109,8 @@ TEST(UstringTest, ConstructionConversionsSprintfComparisonEditsHexGuidSplitAndSu
         std::set<ustring, ostrand::LessStrCaseSensitiveW> set{L"stale"};
         const auto split = [&text = s, d = delimiter, keep = keepLastEmpty](auto& out)
         { d == nullptr ? ustring::split(text, out) : ustring::split(text, d, out, keep); };
-        split(v), split(set);
+        split(v);
+        split(set);
         if (delimiter != nullptr && std::wcslen(delimiter) == 1)
             ustring::split(s, delimiter[0], c, keepLastEmpty);
         EXPECT_TRUE(v == expected && c == expected && set == decltype(set)(expected.begin(), expected.end()));
