@@ -8,7 +8,7 @@
 #include <stdexcept>
 #include <utility>
 
-#include "logging/ScopedLock.h"
+#include "internal/ScopedLock.h"
 
 namespace ostrand
 {

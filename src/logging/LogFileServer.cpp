@@ -4,7 +4,7 @@
 #include <atomic>
 #include <cstdlib>
 
-#include "logging/ScopedLock.h"
+#include "internal/ScopedLock.h"
 
 namespace ostrand
 {
